@@ -1,0 +1,83 @@
+# Build helpers shared by every directory of the project.
+
+# Warnings for our own targets. Dependencies are included as system headers,
+# so -Werror only ever fires on our code.
+function(orvex_target_warnings target)
+  target_compile_options(${target} PRIVATE
+    -Wall -Wextra -Wpedantic -Wshadow -Wnon-virtual-dtor -Wcast-align
+    -Woverloaded-virtual -Wnull-dereference -Wformat=2 -Wimplicit-fallthrough
+    -Wmisleading-indentation -Wduplicated-cond -Wlogical-op)
+  if(ORVEX_WERROR)
+    target_compile_options(${target} PRIVATE -Werror)
+  endif()
+  if(NOT ORVEX_SANITIZE STREQUAL "")
+    # Sanitizer instrumentation makes GCC's flow analysis report false
+    # "may be used uninitialized" warnings in union-based value types.
+    target_compile_options(${target} PRIVATE -Wno-maybe-uninitialized)
+  endif()
+endfunction()
+
+# Sanitizer flags apply to every target of the build tree, dependencies' code
+# compiled here included, so that instrumentation is consistent.
+macro(orvex_configure_sanitizers)
+  if(ORVEX_SANITIZE STREQUAL "address")
+    add_compile_options(-fsanitize=address,undefined -fno-sanitize-recover=all
+                        -fno-omit-frame-pointer)
+    add_link_options(-fsanitize=address,undefined -fno-sanitize-recover=all)
+  elseif(ORVEX_SANITIZE STREQUAL "thread")
+    add_compile_options(-fsanitize=thread -fno-omit-frame-pointer)
+    add_link_options(-fsanitize=thread)
+  elseif(NOT ORVEX_SANITIZE STREQUAL "")
+    message(FATAL_ERROR "ORVEX_SANITIZE must be empty, 'address' or 'thread'")
+  endif()
+endmacro()
+
+# Log lines name the source unit relative to orvex/ without its extension
+# (for example "api/debug/perf_trace"). Each library source gets its unit as
+# the ORVEX_SOURCE_UNIT definition.
+function(orvex_set_source_units target)
+  get_target_property(sources ${target} SOURCES)
+  get_target_property(source_dir ${target} SOURCE_DIR)
+  foreach(src IN LISTS sources)
+    if(NOT src MATCHES "\\.(cc|cpp)$")
+      continue()
+    endif()
+    if(IS_ABSOLUTE "${src}")
+      set(abs "${src}")
+    else()
+      set(abs "${source_dir}/${src}")
+    endif()
+    file(RELATIVE_PATH rel "${PROJECT_SOURCE_DIR}" "${abs}")
+    string(REGEX REPLACE "^orvex/" "" unit "${rel}")
+    string(REGEX REPLACE "\\.(cc|cpp)$" "" unit "${unit}")
+    set_property(SOURCE "${abs}" TARGET_DIRECTORY ${target}
+                 APPEND PROPERTY COMPILE_DEFINITIONS "ORVEX_SOURCE_UNIT=\"${unit}\"")
+  endforeach()
+endfunction()
+
+# orvex_test(NAME SOURCES a_test.cc ... [LIBS extra ...] [LABELS l ...]
+#            [NO_PLATFORM])
+# One test binary per unit, registered with ctest under NAME. Tests labelled
+# "concurrency" also run in the ThreadSanitizer pass.
+function(orvex_test name)
+  if(NOT ORVEX_BUILD_TESTS)
+    return()
+  endif()
+  cmake_parse_arguments(T "" "" "SOURCES;LIBS;LABELS" ${ARGN})
+  add_executable(${name} ${T_SOURCES})
+  target_link_libraries(${name} PRIVATE orvex_base orvex_testing GTest::gmock_main ${T_LIBS})
+  orvex_target_warnings(${name})
+  add_test(NAME ${name} COMMAND ${name})
+  set_tests_properties(${name} PROPERTIES TIMEOUT 300)
+  if(T_LABELS)
+    set_tests_properties(${name} PROPERTIES LABELS "${T_LABELS}")
+  endif()
+endfunction()
+
+# orvex_benchmark(NAME SOURCES a_benchmark.cc ... [LIBS extra ...])
+function(orvex_benchmark name)
+  cmake_parse_arguments(B "" "" "SOURCES;LIBS" ${ARGN})
+  add_executable(${name} ${B_SOURCES})
+  target_link_libraries(${name} PRIVATE orvex_base benchmark::benchmark ${B_LIBS})
+  orvex_target_warnings(${name})
+endfunction()

@@ -1,0 +1,117 @@
+#include "orvex/status/statusor.h"
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "gmock/gmock.h"
+#include "gtest/gtest.h"
+#include "orvex/status/status_macros.h"
+#include "orvex/status/status_matchers.h"
+
+namespace orvex {
+namespace {
+
+using ::orvex::testing::IsOk;
+using ::orvex::testing::IsOkAndHolds;
+using ::orvex::testing::StatusIs;
+using ::testing::HasSubstr;
+
+constexpr char kOkCtorMessage[] = "An OK status is not a valid constructor argument to StatusOr<T>";
+
+TEST(StatusOrTest, ValueAndError) {
+  StatusOr<int> v = 7;
+  EXPECT_THAT(v, IsOkAndHolds(7));
+  EXPECT_EQ(*v, 7);
+  StatusOr<int> e = NotFoundError("no");
+  EXPECT_THAT(e, StatusIs(StatusCode::kNotFound, "no"));
+  EXPECT_EQ(e.value_or(3), 3);
+  EXPECT_THAT(StatusOr<int>(), StatusIs(StatusCode::kUnknown, ""));
+}
+
+TEST(StatusOrTest, OkStatusIsReplacedByInternal) {
+  EXPECT_THAT(StatusOr<int>(OkStatus()), StatusIs(StatusCode::kInternal, kOkCtorMessage));
+  StatusBuilder ok_builder(OkStatus(), ORVEX_LOC);
+  ok_builder << "ignored";
+  EXPECT_THAT(StatusOr<int>(ok_builder), StatusIs(StatusCode::kInternal, kOkCtorMessage));
+  StatusOr<int> assigned = 1;
+  assigned = OkStatus();
+  EXPECT_THAT(assigned, StatusIs(StatusCode::kInternal, kOkCtorMessage));
+}
+
+TEST(StatusOrTest, FromBuilder) {
+  StatusOr<std::string> s = InvalidArgumentErrorBuilder(ORVEX_LOC) << "size " << 5;
+  EXPECT_THAT(s, StatusIs(StatusCode::kInvalidArgument, "size 5"));
+}
+
+TEST(StatusOrTest, CopyMoveAssignKeepsOwnership) {
+  auto counter = std::make_shared<int>(0);
+  StatusOr<std::shared_ptr<int>> a = counter;
+  EXPECT_EQ(counter.use_count(), 2);
+  {
+    StatusOr<std::shared_ptr<int>> b = a;
+    EXPECT_EQ(counter.use_count(), 3);
+    StatusOr<std::shared_ptr<int>> c = std::move(b);
+    EXPECT_EQ(counter.use_count(), 3);
+    c = AbortedError("x");  // Destroys the held value.
+    EXPECT_EQ(counter.use_count(), 2);
+    c = a;
+    EXPECT_EQ(counter.use_count(), 3);
+    c.emplace(std::make_shared<int>(1));
+    EXPECT_EQ(counter.use_count(), 2);
+  }
+  EXPECT_EQ(counter.use_count(), 2);
+  a = NotFoundError("");
+  EXPECT_EQ(counter.use_count(), 1);
+}
+
+TEST(StatusOrTest, Conversions) {
+  StatusOr<std::unique_ptr<int>> p = std::make_unique<int>(4);
+  StatusOr<std::shared_ptr<int>> q = std::move(p);
+  ASSERT_THAT(q, IsOk());
+  EXPECT_EQ(**q, 4);
+  StatusOr<const char*> text = "abc";
+  StatusOr<std::string> str = text;
+  EXPECT_THAT(str, IsOkAndHolds("abc"));
+  StatusOr<int> err = DataLossError("d");
+  StatusOr<long> err_long = err;
+  EXPECT_THAT(err_long, StatusIs(StatusCode::kDataLoss, "d"));
+  StatusOr<std::vector<int>> in_place(std::in_place, 3, 9);
+  EXPECT_THAT(in_place, IsOkAndHolds(std::vector<int>{9, 9, 9}));
+}
+
+StatusOr<int> Half(int v) {
+  if (v % 2 != 0) return InvalidArgumentErrorBuilder(ORVEX_LOC) << "odd " << v;
+  return v / 2;
+}
+
+StatusOr<int> Quarter(int v) {
+  ORVEX_ASSIGN_OR_RETURN(int half, Half(v));
+  ORVEX_ASSIGN_OR_RETURN(half, Half(half));
+  return half;
+}
+
+Status CheckQuarter(int v) {
+  ORVEX_RETURN_IF_ERROR(Quarter(v)) << "quarter of " << v;
+  ORVEX_RETURN_IF_ERROR(OkStatus());
+  return OkStatus();
+}
+
+TEST(StatusMacrosTest, Propagation) {
+  EXPECT_THAT(Quarter(8), IsOkAndHolds(2));
+  EXPECT_THAT(Quarter(6), StatusIs(StatusCode::kInvalidArgument, "odd 3"));
+  EXPECT_THAT(CheckQuarter(8), IsOk());
+  EXPECT_THAT(CheckQuarter(6), StatusIs(StatusCode::kInvalidArgument, "odd 3; quarter of 6"));
+  EXPECT_THAT(CheckQuarter(5), StatusIs(StatusCode::kInvalidArgument, HasSubstr("odd 5")));
+}
+
+TEST(StatusOrDeathTest, ValueOfErrorIsFatal) {
+  StatusOr<int> e = NotFoundError("missing frame");
+  EXPECT_DEATH((void)e.value(),
+               "Attempting to fetch value instead of handling error NOT_FOUND: missing frame");
+  const StatusOr<std::string> c = StatusOr<std::string>(AbortedError(""));
+  EXPECT_DEATH((void)c->size(), "Attempting to fetch value instead of handling error ABORTED: ");
+}
+
+}  // namespace
+}  // namespace orvex

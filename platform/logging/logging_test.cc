@@ -1,0 +1,55 @@
+#include "android-base/logging.h"
+
+#include <errno.h>
+#include <stdlib.h>
+
+#include "gmock/gmock.h"
+#include "gtest/gtest.h"
+
+namespace {
+
+using ::testing::ContainsRegex;
+
+TEST(HostLoggingTest, OneLinePerMessageWithErrnoText) {
+  ::testing::internal::CaptureStderr();
+  errno = EBADF;
+  {
+    android::base::LogMessage m("api/thread/fence", 42, android::base::ERROR, "camtag", ENOENT);
+    m.stream() << "first";
+  }
+  EXPECT_EQ(errno, EBADF);
+  {
+    android::base::LogMessage m("u", 1, android::base::INFO, nullptr, -1);
+    m.stream() << "second";
+  }
+  const std::string out = ::testing::internal::GetCapturedStderr();
+  EXPECT_THAT(out, ContainsRegex("^E camtag [0-9]+ [0-9]+ api/thread/fence:42\\] first: No such "
+                                 "file or directory\n"));
+  EXPECT_THAT(out, ContainsRegex("\nI [^ ]+ [0-9]+ [0-9]+ u:1\\] second\n$"));
+}
+
+TEST(HostLoggingTest, DefaultThresholdIsInfo) {
+  // The test runs without ORVEX_LOG_SEVERITY set.
+  if (getenv("ORVEX_LOG_SEVERITY") != nullptr) GTEST_SKIP() << "ORVEX_LOG_SEVERITY is set";
+  EXPECT_FALSE(android::base::ShouldLog(android::base::DEBUG, nullptr));
+  EXPECT_TRUE(android::base::ShouldLog(android::base::INFO, nullptr));
+  EXPECT_TRUE(android::base::ShouldLog(android::base::FATAL, nullptr));
+}
+
+TEST(HostLoggingDeathTest, ThresholdFromEnvironmentAndFatalAborts) {
+  // The threshold is read once per process: re-execute for a fresh one.
+  GTEST_FLAG_SET(death_test_style, "threadsafe");
+  EXPECT_EXIT(
+      {
+        setenv("ORVEX_LOG_SEVERITY", "error", 1);
+        const bool warn = android::base::ShouldLog(android::base::WARNING, nullptr);
+        const bool err = android::base::ShouldLog(android::base::ERROR, nullptr);
+        _exit(!warn && err ? 0 : 1);
+      },
+      ::testing::ExitedWithCode(0), "");
+  EXPECT_DEATH(android::base::LogMessage("f", 3, android::base::FATAL, nullptr, -1).stream()
+                   << "the end",
+               "F .* f:3\\] the end");
+}
+
+}  // namespace
