@@ -34,8 +34,8 @@ size_t GetPayloadStride(int width, int bits_per_pixel, int payload_stride_alignm
   ORVEX_CHECK(payload_stride_alignment == 32 || payload_stride_alignment == 64)
       << "value: " << payload_stride_alignment;
   const int64_t block_samples = int64_t{kBlockWidth} * kBlockHeight;
-  const size_t block_bits = AlignToPower2(
-      static_cast<size_t>(block_samples * bits_per_pixel), static_cast<size_t>(2 * block_samples));
+  const size_t block_bits = AlignToPower2(static_cast<size_t>(block_samples * bits_per_pixel),
+                                          static_cast<size_t>(2 * block_samples));
   const size_t block_bytes =
       AlignToPower2(block_bits / 8, static_cast<size_t>(payload_stride_alignment));
   const auto blocks = static_cast<size_t>(CeilDiv(width, kBlockWidth));
@@ -44,8 +44,8 @@ size_t GetPayloadStride(int width, int bits_per_pixel, int payload_stride_alignm
 
 namespace detail {
 
-inline int64_t LossyBayerPayloadStride(int width, int bits_per_pixel,
-                                       int payload_stride_alignment, int compression_ratio) {
+inline int64_t LossyBayerPayloadStride(int width, int bits_per_pixel, int payload_stride_alignment,
+                                       int compression_ratio) {
   ORVEX_CHECK(bits_per_pixel == 16)
       << "SBWC lossy bayer formats don't support bits_per_pixel: " << bits_per_pixel;
   ORVEX_CHECK(compression_ratio == 50 || compression_ratio == 75)
@@ -96,18 +96,16 @@ inline int64_t UVHeaderSize(int width, int height, int header_stride_alignment) 
 // ratio 50 or 75; 32-pixel blocks of 256 or 384 bytes, each aligned.
 inline int GetLossyBayerPayloadStride(int width, int bits_per_pixel, int payload_stride_alignment,
                                       int compression_ratio) {
-  return static_cast<int>(detail::LossyBayerPayloadStride(width, bits_per_pixel,
-                                                          payload_stride_alignment,
-                                                          compression_ratio));
+  return static_cast<int>(detail::LossyBayerPayloadStride(
+      width, bits_per_pixel, payload_stride_alignment, compression_ratio));
 }
 
 // Row stride of a lossy luma or chroma payload: 8 bits with ratio 50 or 75,
 // or 10 bits with ratio 40, 60 or 80; 32-pixel blocks, each aligned.
 inline int GetLossyYuvPayloadStride(int width, int bits_per_pixel, int payload_stride_alignment,
                                     int compression_ratio) {
-  return static_cast<int>(detail::LossyYuvPayloadStride(width, bits_per_pixel,
-                                                        payload_stride_alignment,
-                                                        compression_ratio));
+  return static_cast<int>(detail::LossyYuvPayloadStride(
+      width, bits_per_pixel, payload_stride_alignment, compression_ratio));
 }
 
 // Header area of a lossless luma plane (alignment 16 or 64).
