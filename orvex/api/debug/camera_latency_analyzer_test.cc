@@ -99,22 +99,13 @@ TEST(LatencyThresholdTest, OperationKinds) {
     const char* operation;
     float threshold;  // 0: not checked
   };
+  // clang-format off
   const Case cases[] = {
-      {"Open", 300},
-      {"Camera-Open", 300},
-      {"camera0-OPEN", 300},
-      {"Close", 250},
-      {"Camera-Close", 250},
-      {"Reconfiguration", 715},
-      {"Camera-reconfiguration", 715},
-      {"Camera-Open-Close", 250},
-      {"OpenCamera", 0},
-      {"Camera-Opened", 0},
-      {"Camera-Open ", 0},
-      {"Warmup", 0},
-      {"", 0},
-      {"Camera-", 0},
-  };
+      {"Open", 300}, {"Camera-Open", 300}, {"camera0-OPEN", 300}, {"Close", 250},
+      {"Camera-Close", 250}, {"Reconfiguration", 715}, {"Camera-reconfiguration", 715},
+      {"Camera-Open-Close", 250}, {"OpenCamera", 0}, {"Camera-Opened", 0}, {"Camera-Open ", 0},
+      {"Warmup", 0}, {"", 0}, {"Camera-", 0}};
+  // clang-format on
   for (const Case& c : cases) {
     SCOPED_TRACE(c.operation);
     const std::optional<float> threshold = CameraLatencyAnalyzer::LatencyThresholdMs(c.operation);
@@ -193,8 +184,7 @@ TEST_F(LatencyAnalyzerTest, OnlyHyphenCloseEndsTheSession) {
   const Case cases[] = {
       {"Camera-Close", true},   {"CAMERA-CLOSE", true},   {"x-cLoSe", true},
       {"-Close", true},         {"CameraClose", false},   {"Close", false},
-      {"Camera-Close ", false}, {"Camera-Closed", false}, {"Camera-Close-Open", false},
-  };
+      {"Camera-Close ", false}, {"Camera-Closed", false}, {"Camera-Close-Open", false}};
   size_t files = 0;
   for (const Case& c : cases) {
     SCOPED_TRACE(c.operation);
@@ -206,84 +196,45 @@ TEST_F(LatencyAnalyzerTest, OnlyHyphenCloseEndsTheSession) {
   }
 }
 
+// Each session: the operation under test, a fast reconfiguration (the slow
+// flag spans the session) and, unless the operation closes, a fast close.
 TEST_F(LatencyAnalyzerTest, CloseDecision) {
   struct Case {
-    const char* name;
     const char* auto_dump;      // "" = unset
     const char* write_to_disk;  // "" = unset
-    std::vector<std::pair<std::string, Events>> operations;
+    const char* operation;
+    const char* event;
+    float duration_ms;
     bool written;
   };
-  const std::string kClose = "Camera-Close";
-  const Events quick_close = {{"Overall", 1}};
-  const std::vector<Case> cases = {
-      {"fast session",
-       "",
-       "",
-       {{"Camera-Open", {{"Overall", 299.9f}}}, {kClose, quick_close}},
-       false},
-      {"open at threshold",
-       "",
-       "",
-       {{"Camera-Open", {{"Overall", 300}}}, {kClose, quick_close}},
-       true},
-      {"auto-dump off",
-       "false",
-       "",
-       {{"Camera-Open", {{"Overall", 1000}}}, {kClose, quick_close}},
-       false},
-      {"auto-dump unreadable",
-       "maybe",
-       "",
-       {{"Camera-Open", {{"Overall", 1000}}}, {kClose, quick_close}},
-       true},
-      {"write-to-disk on",
-       "0",
-       "1",
-       {{"Camera-Open", {{"Overall", 10}}}, {kClose, quick_close}},
-       true},
-      {"write-to-disk off but slow",
-       "",
-       "no",
-       {{"Camera-Reconfiguration", {{"Overall", 715}}}, {kClose, quick_close}},
-       true},
-      {"write-to-disk unreadable",
-       "",
-       "TRUE",
-       {{"Camera-Open", {{"Overall", 10}}}, {kClose, quick_close}},
-       false},
-      {"reconfiguration under",
-       "",
-       "",
-       {{"Camera-Reconfiguration", {{"Overall", 714.9f}}}, {kClose, quick_close}},
-       false},
-      {"overall in other case",
-       "",
-       "",
-       {{"Camera-Open", {{"overall", 1000}, {"OVERALL", 1000}}}, {kClose, quick_close}},
-       false},
-      {"other steps never count",
-       "",
-       "",
-       {{"Camera-Open", {{"Overall", 10}, {"Startup", 5000}}}, {kClose, quick_close}},
-       false},
-      {"unchecked kind", "", "", {{"Warmup", {{"Overall", 99999}}}, {kClose, quick_close}}, false},
-      {"slow close", "", "", {{kClose, {{"Overall", 250}}}}, true},
-      {"close under", "", "", {{kClose, {{"Overall", 249.9f}}}}, false},
-      {"slow op anywhere",
-       "",
-       "",
-       {{"Camera-Open", {{"Overall", 400}}},
-        {"Camera-Reconfiguration", {{"Overall", 1}}},
-        {kClose, quick_close}},
-       true},
-  };
+  // clang-format off
+  const Case cases[] = {
+      {"", "", "Camera-Open", "Overall", 299.9f, false},
+      {"", "", "Camera-Open", "Overall", 300, true},
+      {"false", "", "Camera-Open", "Overall", 1000, false},
+      {"maybe", "", "Camera-Open", "Overall", 1000, true},   // unreadable auto-dump: on
+      {"0", "1", "Camera-Open", "Overall", 10, true},
+      {"", "no", "Camera-Reconfiguration", "Overall", 715, true},
+      {"", "TRUE", "Camera-Open", "Overall", 10, false},     // unreadable write-to-disk: off
+      {"", "", "Camera-Reconfiguration", "Overall", 714.9f, false},
+      {"", "", "Camera-Open", "overall", 1000, false},
+      {"", "", "Camera-Open", "Startup", 5000, false},
+      {"", "", "Warmup", "Overall", 99999, false},
+      {"", "", "Camera-Close", "Overall", 250, true},
+      {"", "", "Camera-Close", "Overall", 249.9f, false}};
+  // clang-format on
   size_t files = 0;
   for (const Case& c : cases) {
-    SCOPED_TRACE(c.name);
+    SCOPED_TRACE(std::string(c.operation) + " " + c.event + " " + std::to_string(c.duration_ms) +
+                 " auto_dump=" + c.auto_dump + " write_to_disk=" + c.write_to_disk);
     SetProperty(kCameraPerformanceAnalyzerAutoDumpLatencyProperty, c.auto_dump);
     SetProperty(kCameraPerformanceAnalyzerWriteToDiskProperty, c.write_to_disk);
-    for (const auto& [operation, events] : c.operations) analyzer_.InjectEvent(operation, events);
+    analyzer_.InjectEvent("Camera-Reconfiguration", {{"Overall", 1}});
+    analyzer_.InjectEvent(c.operation, {{c.event, c.duration_ms}});
+    if (std::string_view(c.operation) != "Camera-Close") {
+      analyzer_.InjectEvent("Camera-Reconfiguration", {{"Overall", 1}});
+      analyzer_.InjectEvent("Camera-Close", {{"Overall", 1}});
+    }
     if (c.written) ++files;
     EXPECT_EQ(Files().size(), files);
     EXPECT_EQ(RecordedOperations(), 0);

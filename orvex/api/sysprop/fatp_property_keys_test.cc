@@ -41,8 +41,7 @@ TEST(FatpPropertyKeysTest, EveryTagHasItsOwnKey) {
       {32, "vendor.camera.fatp.rtele.sn"},
       {53, "vendor.camera.fatp.rultrawide.af.sensitivity"},
       {59, "vendor.camera.fatp.front.inner.sn"},
-      {65, "vendor.camera.fatp.af.pos_dac"},
-  };
+      {65, "vendor.camera.fatp.af.pos_dac"}};
   for (const auto& [value, key] : spot_checks) {
     EXPECT_EQ(GetFatpSystemPropertyKeyOrDie(static_cast<FatpTag>(value)), key);
   }
