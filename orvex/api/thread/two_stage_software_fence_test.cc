@@ -203,6 +203,16 @@ TEST(TwoStageSoftwareFenceDeathTest, ForfeitWithOkIsFatal) {
                "OkStatus\\(\\)=OK\\) Cannot forfeit with Ok status, even to confuse the enemy\\.");
 }
 
+TEST(TwoStageSoftwareFenceDeathTest, DestroyedByItsOwnListener) {
+  EXPECT_DEATH(
+      {
+        auto* fence = new TwoStageSoftwareFence();
+        (void)fence->AddListener([fence](Status) { delete fence; });
+        (void)fence->SignalDone(kE1);
+      },
+      "TwoStageSoftwareFence destroyed by one of its own listeners while being signalled");
+}
+
 // A producer racing a consumer that forfeits: exactly one of them wins the
 // ready-to-start stage, and every listener runs exactly once.
 TEST(TwoStageSoftwareFenceStressTest, ForfeitRacesLateProducer) {
