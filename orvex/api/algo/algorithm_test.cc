@@ -1,7 +1,5 @@
 #include "orvex/api/algo/algorithm.h"
 
-#include <type_traits>
-
 #include "gmock/gmock.h"
 #include "gtest/gtest.h"
 #include "orvex/status/status_matchers.h"
@@ -134,18 +132,6 @@ TEST(AlgorithmForwardingTest, DirectOverrideWins) {
   EXPECT_THAT(algorithm.Flush(5), StatusIs(StatusCode::kAborted, "direct 5"));
   EXPECT_CALL(mock, EndAeSession(5)).WillOnce(Return(orvex::OkStatus()));
   EXPECT_THAT(algorithm.EndSession(5), IsOk());
-}
-
-TEST(AlgorithmInterfacesTest, AllAreAbstractAndDeriveFromAlgorithm) {
-  static_assert(std::has_virtual_destructor_v<Algorithm>);
-  static_assert(
-      std::is_abstract_v<Algorithm> && std::is_abstract_v<AutoExposureInterface> &&
-      std::is_abstract_v<AutoFocusInterface> && std::is_abstract_v<AutoSceneDetectionInterface> &&
-      std::is_abstract_v<AutoWhiteBalanceInterface> && std::is_abstract_v<SaliencyInterface> &&
-      std::is_abstract_v<ActuatorTuningInterface>);
-  static_assert(!std::is_abstract_v<MockAe> && !std::is_abstract_v<MockAf> &&
-                !std::is_abstract_v<MockAsd> && !std::is_abstract_v<MockAwb> &&
-                !std::is_abstract_v<MockSaliency> && !std::is_abstract_v<MockActuator>);
 }
 
 }  // namespace
