@@ -3,6 +3,7 @@
 #include <cmath>
 #include <cstdint>
 #include <limits>
+#include <string>
 
 #include "gtest/gtest.h"
 
@@ -93,14 +94,20 @@ TEST(QCodecTest, RoundTrip) {
 }
 
 TEST(QCodecDeathTest, RefusesCodesWiderThan64Bits) {
-  EXPECT_DEATH(
-      (QCodec{40, 24}.Encode(1.0)),
-      "QCodec with integer_bits 40 and fraction_bits 24 does not fit a 64-bit code \\(need "
-      "both >= 0 and a sum <= 63\\)");
-  EXPECT_DEATH((QCodec{-1, 4}.Decode(0)),
-               "QCodec with integer_bits -1 and fraction_bits 4 does not fit a 64-bit code");
-  EXPECT_DEATH((QCodec{2147483647, 2147483647}.Decode(0)),
-               "QCodec with integer_bits 2147483647 and fraction_bits 2147483647 does not fit");
+  const struct {
+    int32_t integer_bits;
+    int32_t fraction_bits;
+    const char* bits;
+  } cases[] = {{40, 24, "40 and fraction_bits 24"},
+               {-1, 4, "-1 and fraction_bits 4"},
+               {2147483647, 2147483647, "2147483647 and fraction_bits 2147483647"}};
+  for (const auto& c : cases) {
+    const std::string text = std::string("QCodec with integer_bits ") + c.bits +
+                             " does not fit a 64-bit code \\(need both >= 0 and a sum <= 63\\)";
+    const QCodec codec{c.integer_bits, c.fraction_bits};
+    EXPECT_DEATH(codec.Encode(1.0), text);
+    EXPECT_DEATH(codec.Decode(0), text);
+  }
 }
 
 }  // namespace
