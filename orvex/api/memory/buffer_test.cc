@@ -16,6 +16,7 @@
 // Huge allocations must fail with a null pointer, not end the process, so
 // that HeapBuffer::Make can report them.
 extern "C" const char* __asan_default_options() { return "allocator_may_return_null=1"; }
+extern "C" const char* __tsan_default_options() { return "allocator_may_return_null=1"; }
 
 namespace orvex {
 namespace {
