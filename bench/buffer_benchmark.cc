@@ -43,8 +43,8 @@ int MakeMemfd() {
 }
 
 void ReportAllocations(benchmark::State& state, uint64_t before) {
-  state.counters["allocs"] = benchmark::Counter(
-      static_cast<double>(g_allocations.load() - before) / static_cast<double>(state.iterations()));
+  state.counters["allocs"] = benchmark::Counter(static_cast<double>(g_allocations.load() - before) /
+                                                static_cast<double>(state.iterations()));
 }
 
 void BM_HeapBufferMapRelease(benchmark::State& state) {
@@ -99,7 +99,8 @@ void BM_MmapMunmapOnePageRead(benchmark::State& state) {
   if (pwrite(fd, "x", 1, 0) != 1) std::abort();
   for (auto _ : state) {
     void* p = mmap(nullptr, kSize, PROT_READ, MAP_SHARED, fd, 0);
-    benchmark::DoNotOptimize(*static_cast<volatile char*>(p));
+    char first = *static_cast<volatile const char*>(p);
+    benchmark::DoNotOptimize(first);
     munmap(p, kSize);
   }
   close(fd);
