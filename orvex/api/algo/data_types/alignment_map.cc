@@ -128,7 +128,9 @@ StatusOr<std::unique_ptr<Buffer::MappedHandle>> AlignmentMap::Unpack(
   auto* out = static_cast<unsigned char*>(handle->data());
   const auto* in = static_cast<const unsigned char*>(buffer_handle_->data());
   // The unpacked range is overwritten below; only the rest needs zeroes.
-  std::memset(out + required, 0, static_cast<size_t>(handle->size() - required));
+  if (handle->size() > required) {
+    std::memset(out + required, 0, static_cast<size_t>(handle->size() - required));
+  }
   if (vectors) {
     if (IsAligned(in, alignof(uint32_t)) && IsAligned(out, alignof(int32_t))) {
       UnpackMotionVectorWords({reinterpret_cast<const uint32_t*>(in), words},

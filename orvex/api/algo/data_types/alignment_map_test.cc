@@ -26,13 +26,13 @@ std::shared_ptr<RecordingBuffer> Packed(uint64_t bytes, const std::vector<uint32
                                         std::unique_ptr<Fence> fence = nullptr) {
   auto buffer =
       std::make_shared<RecordingBuffer>(bytes, BufferAttributes{}, -1, 0, std::move(fence));
-  std::memcpy(buffer->bytes(), words.data(), words.size() * 4);
+  if (!words.empty()) std::memcpy(buffer->bytes(), words.data(), words.size() * 4);
   return buffer;
 }
 
 std::shared_ptr<RecordingBuffer> Output(uint64_t bytes, unsigned char fill = 0xAB) {
   auto buffer = std::make_shared<RecordingBuffer>(bytes, BufferAttributes{});
-  std::memset(buffer->bytes(), fill, bytes);
+  if (bytes > 0) std::memset(buffer->bytes(), fill, bytes);
   return buffer;
 }
 
