@@ -79,21 +79,10 @@ void BM_MatchingErrorsScalar(benchmark::State& state) {
   state.SetBytesProcessed(state.iterations() * state.range(0) * 5);
 }
 
-// memcpy of the motion-vector output's size (8 bytes per word).
-void BM_MemcpyVectorBytes(benchmark::State& state) {
-  const size_t bytes = static_cast<size_t>(state.range(0)) * 8;
-  std::vector<unsigned char> in(bytes, 1);
-  std::vector<unsigned char> out(bytes);
-  for (auto _ : state) {
-    std::memcpy(out.data(), in.data(), bytes);
-    benchmark::ClobberMemory();
-  }
-  state.SetBytesProcessed(state.iterations() * static_cast<int64_t>(bytes) * 2);
-}
-
-// memcpy of the packed map's size (4 bytes per word).
-void BM_MemcpyPackedBytes(benchmark::State& state) {
-  const size_t bytes = static_cast<size_t>(state.range(0)) * 4;
+// memcpy of range(1) bytes per word: 8 for the motion-vector output's
+// size, 4 for the packed map's.
+void BM_Memcpy(benchmark::State& state) {
+  const auto bytes = static_cast<size_t>(state.range(0) * state.range(1));
   std::vector<unsigned char> in(bytes, 1);
   std::vector<unsigned char> out(bytes);
   for (auto _ : state) {
@@ -126,11 +115,11 @@ void BM_AlignmentMapUnpackMotionVectors(benchmark::State& state) {
 
 BENCHMARK(BM_MotionVectorsKernel)->Arg(kMapWords4032x3024)->Arg(kLargeWords);
 BENCHMARK(BM_MotionVectorsScalar)->Arg(kMapWords4032x3024)->Arg(kLargeWords);
-BENCHMARK(BM_MemcpyVectorBytes)->Arg(kMapWords4032x3024)->Arg(kLargeWords);
+BENCHMARK(BM_Memcpy)->Args({kMapWords4032x3024, 8})->Args({kLargeWords, 8});
 BENCHMARK(BM_AlignmentMapUnpackMotionVectors)->Arg(kMapWords4032x3024)->Arg(kLargeWords);
 BENCHMARK(BM_MatchingErrorsKernel)->Arg(kMapWords4032x3024)->Arg(kLargeWords);
 BENCHMARK(BM_MatchingErrorsScalar)->Arg(kMapWords4032x3024)->Arg(kLargeWords);
-BENCHMARK(BM_MemcpyPackedBytes)->Arg(kMapWords4032x3024)->Arg(kLargeWords);
+BENCHMARK(BM_Memcpy)->Args({kMapWords4032x3024, 4})->Args({kLargeWords, 4});
 
 void BM_GlobalToneMap(benchmark::State& state) {
   auto data = orvex::HeapAllocateLocalToneMappingDataV1().value();

@@ -38,35 +38,26 @@ TEST(AlgorithmRecordsTest, EnumerationTexts) {
       {ToString(static_cast<PdafSoftwareFeatureFlag>(6)),
        "dynamic downsample, hot pixel suppression"},
       {ToString(static_cast<PdafSoftwareFeatureFlag>(0xFFF9)), ""},
-      {ToString(CsiDataType::k8BitData), "8_bit_data"},
-      {ToString(static_cast<CsiDataType>(19)), "unknown_csi_data_type"},
-      {ToString(static_cast<CsiDataType>(24)), "yuv_420_8_bit"},
-      {ToString(static_cast<CsiDataType>(25)), "yuv_420_10_bit"},
-      {ToString(static_cast<CsiDataType>(30)), "yuv_422_8_bit"},
-      {ToString(static_cast<CsiDataType>(31)), "yuv_422_10_bit"},
-      {ToString(static_cast<CsiDataType>(32)), "rgb_444"},
-      {ToString(static_cast<CsiDataType>(33)), "rgb_555"},
-      {ToString(static_cast<CsiDataType>(34)), "rgb_565"},
-      {ToString(static_cast<CsiDataType>(35)), "rgb_666"},
-      {ToString(static_cast<CsiDataType>(36)), "rgb_888"},
-      {ToString(static_cast<CsiDataType>(37)), "unknown_csi_data_type"},
-      {ToString(static_cast<CsiDataType>(40)), "raw_6"},
-      {ToString(static_cast<CsiDataType>(41)), "raw_7"},
-      {ToString(static_cast<CsiDataType>(42)), "raw_8"},
-      {ToString(static_cast<CsiDataType>(43)), "raw_10"},
-      {ToString(static_cast<CsiDataType>(44)), "raw_12"},
-      {ToString(static_cast<CsiDataType>(45)), "raw_14"},
-      {ToString(static_cast<CsiDataType>(46)), "raw_16"},
-      {ToString(static_cast<CsiDataType>(47)), "raw_20"},
-      {ToString(static_cast<CsiDataType>(48)), "user_defined_0"},
-      {ToString(static_cast<CsiDataType>(51)), "user_defined_3"},
-      {ToString(static_cast<CsiDataType>(55)), "user_defined_7"},
-      {ToString(static_cast<CsiDataType>(56)), "unknown_csi_data_type"},
-      {ToString(static_cast<CsiDataType>(63)), "undefined"},
       {Text(CsiDataType::kRaw10), "raw_10"},
       {Text(PdafAutoFocusMode::kVideoRecording), "video recording"},
   };
   for (const auto& [got, want] : cases) EXPECT_EQ(got, want);
+
+  // Every code from 17 to 64, joined.
+  std::string csi;
+  for (int code = 17; code <= 64; ++code) csi += ToString(static_cast<CsiDataType>(code)) + "|";
+  const std::string unknown = "unknown_csi_data_type|";
+  std::string want = unknown + "8_bit_data|";
+  for (int i = 0; i < 5; ++i) want += unknown;
+  want += "yuv_420_8_bit|yuv_420_10_bit|";
+  for (int i = 0; i < 4; ++i) want += unknown;
+  want += "yuv_422_8_bit|yuv_422_10_bit|rgb_444|rgb_555|rgb_565|rgb_666|rgb_888|";
+  for (int i = 0; i < 3; ++i) want += unknown;
+  want += "raw_6|raw_7|raw_8|raw_10|raw_12|raw_14|raw_16|raw_20|";
+  for (int i = 0; i < 8; ++i) want += "user_defined_" + std::to_string(i) + "|";
+  for (int i = 0; i < 7; ++i) want += unknown;
+  want += "undefined|" + unknown;
+  EXPECT_EQ(csi, want);
 }
 
 TEST(AlgorithmRecordsTest, PdafSettingTexts) {

@@ -42,31 +42,6 @@ std::vector<uint32_t> WordPatterns(size_t random_count) {
   return words;
 }
 
-TEST(DataKernelsTest, KnownWords) {
-  const struct {
-    uint32_t word;
-    int32_t first, second;
-    uint8_t error;
-  } cases[] = {{0x7FF00000, 2047, 0, 0},
-               {0x80000000, -2048, 0, 0},
-               {0x000FFF00, 0, -1, 0},
-               {0x000000FF, 0, 0, 255},
-               {0xFFFFFFFF, -1, -1, 255},
-               {0x00180080, 1, -2048, 0x80},
-               {0x80080001, -2048, 2048 - 4096 + 0, 1}};
-  for (const auto& c : cases) {
-    SCOPED_TRACE(c.word);
-    const uint32_t in[1] = {c.word};
-    int32_t mv[2] = {};
-    uint8_t err[1] = {};
-    UnpackMotionVectorWords(in, mv);
-    UnpackMatchingErrorWords(in, err);
-    EXPECT_EQ(mv[0], c.first);
-    EXPECT_EQ(mv[1], c.second);
-    EXPECT_EQ(err[0], c.error);
-  }
-}
-
 TEST(DataKernelsTest, MatchScalarReferenceForEveryLengthAndOffset) {
   const std::vector<uint32_t> all = WordPatterns(4096);
   std::vector<int32_t> want_mv;

@@ -124,14 +124,9 @@ TEST(PixelGridStatisticsParamsTest, LayoutAndAcceptedRegions) {
   const PixelGridStatisticsParams p({10, 20, 650, 500}, 16, 12, 40, 40, 3, 4, 99);
   EXPECT_EQ(p.GetRoiWidth(), 640);
   EXPECT_EQ(p.GetRoiHeight(), 480);
-  EXPECT_EQ(p.grid_width, 16);
-  EXPECT_EQ(p.cell_height, 40);
   EXPECT_EQ(p.start_x, 10);
   EXPECT_EQ(p.start_y, 20);
-  EXPECT_EQ(p.aux_x, 3);
-  EXPECT_EQ(p.aux_y, 4);
   EXPECT_THAT(p.reserved, ::testing::Each(0));
-  EXPECT_EQ(p.aux_value, 99);
   // Empty in either dimension: accepted whatever the grid.
   const PixelGridStatisticsParams empty({5, 5, 5, 5}, 3, 7, 11, 13, 0, 0, 0);
   EXPECT_EQ(empty.GetRoiWidth(), 33);
