@@ -2,6 +2,9 @@
 
 #include <errno.h>
 
+#include <atomic>
+#include <cstdlib>
+#include <new>
 #include <sstream>
 #include <thread>
 #include <vector>
@@ -9,8 +12,35 @@
 #include "gmock/gmock.h"
 #include "gtest/gtest.h"
 
+// The replaced global operators below pair malloc with free; GCC cannot see
+// that the replacement makes them match.
+#pragma GCC diagnostic ignored "-Wmismatched-new-delete"
+
+// Counts heap allocations made by this thread while counting is on.
+namespace {
+thread_local bool g_counting = false;
+thread_local int g_allocations = 0;
+}  // namespace
+
+void* operator new(std::size_t size) {
+  if (g_counting) ++g_allocations;
+  if (void* p = std::malloc(size == 0 ? 1 : size)) return p;
+  throw std::bad_alloc();
+}
+void operator delete(void* p) noexcept { std::free(p); }
+void operator delete(void* p, std::size_t) noexcept { std::free(p); }
+
 namespace orvex {
 namespace {
+
+template <typename Fn>
+int AllocationsIn(Fn fn) {
+  g_allocations = 0;
+  g_counting = true;
+  fn();
+  g_counting = false;
+  return g_allocations;
+}
 
 using ::testing::StartsWith;
 
@@ -66,8 +96,33 @@ TEST(StatusTest, Representation) {
   EXPECT_EQ(with_text.ToString(), "INVALID_ARGUMENT: bad size");
 
   // Copies share the record.
-  Status copy = with_text;
+  Status copy = with_text;  // NOLINT(performance-unnecessary-copy-initialization)
   EXPECT_EQ(copy.raw_rep_for_testing(), with_text.raw_rep_for_testing());
+}
+
+TEST(StatusTest, AllocationCounts) {
+  EXPECT_EQ(AllocationsIn([] {
+              Status s;
+              (void)s;
+            }),
+            0);
+  EXPECT_EQ(AllocationsIn([] {
+              Status s = NotFoundError("");
+              (void)s;
+            }),
+            0);
+  // The record and its text together: one allocation even past the
+  // small-string size.
+  EXPECT_EQ(AllocationsIn([] { Status s = NotFoundError("a message of 30 characters...."); }), 1);
+  const Status shared = NotFoundError("copied message, not reallocated");
+  EXPECT_EQ(AllocationsIn([&] {
+              Status a = shared;  // NOLINT(performance-unnecessary-copy-initialization)
+              Status b = a;
+              Status c = std::move(b);
+              EXPECT_FALSE(c.ok());
+            }),
+            0);
+  EXPECT_EQ(AllocationsIn([] { (void)OkStatus().ToString(); }), 0);
 }
 
 TEST(StatusTest, NonCanonicalRawCode) {

@@ -9,7 +9,7 @@ Status OkStatusOrConstructorError() {
   return InternalError("An OK status is not a valid constructor argument to StatusOr<T>");
 }
 
-void CrashOnValueAccess(Status status) {
+void CrashOnValueAccess(const Status& status) {
   ORVEX_LOG(FATAL) << "Attempting to fetch value instead of handling error " << status.ToString();
   __builtin_unreachable();
 }

@@ -39,7 +39,7 @@ namespace status_internal {
 // The status held by a StatusOr constructed from an OK status.
 ORVEX_EXPORT Status OkStatusOrConstructorError();
 // Writes the FATAL line for a value read from an error StatusOr.
-[[noreturn]] ORVEX_EXPORT void CrashOnValueAccess(Status status);
+[[noreturn]] ORVEX_EXPORT void CrashOnValueAccess(const Status& status);
 
 template <typename T, typename U>
 inline constexpr bool kIsValueArg =
@@ -100,8 +100,10 @@ class [[nodiscard]] StatusOr {
   StatusOr(const StatusOr& other) : status_(other.status_) {
     if (other.ok()) Construct(other.value_);
   }
+  // The source keeps its status (and a moved-from value), so that it stays
+  // consistent: ok() still tells whether it holds a value to destroy.
   StatusOr(StatusOr&& other) noexcept(std::is_nothrow_move_constructible_v<T>)
-      : status_(other.status_) {
+      : status_(other.status_) {  // NOLINT(performance-move-constructor-init)
     if (other.ok()) Construct(std::move(other.value_));
   }
 
@@ -110,14 +112,14 @@ class [[nodiscard]] StatusOr {
             std::enable_if_t<!std::is_same_v<T, U> && std::is_constructible_v<T, const U&>,
                              int> = 0>
   StatusOr(const StatusOr<U>& other)  // NOLINT(google-explicit-constructor)
-      : status_(other.status()) {
-    if (other.ok()) Construct(*other);
+      : status_(other.status_) {
+    if (status_.ok()) Construct(other.value_);
   }
   template <typename U,
             std::enable_if_t<!std::is_same_v<T, U> && std::is_constructible_v<T, U&&>, int> = 0>
   StatusOr(StatusOr<U>&& other)  // NOLINT(google-explicit-constructor)
-      : status_(other.status()) {
-    if (other.ok()) Construct(*std::move(other));
+      : status_(other.status_) {
+    if (status_.ok()) Construct(std::move(other.value_));
   }
 
   StatusOr& operator=(const StatusOr& other) {
@@ -205,10 +207,18 @@ class [[nodiscard]] StatusOr {
   }
 
  private:
+  template <typename U>
+  friend class StatusOr;
+
+  // GCC cannot follow the ok() guard around copies out of the union and
+  // reports the value as maybe uninitialized; the guard makes it safe.
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wmaybe-uninitialized"
   template <typename... Args>
   void Construct(Args&&... args) {
     ::new (static_cast<void*>(&value_)) T(std::forward<Args>(args)...);
   }
+#pragma GCC diagnostic pop
   template <typename U>
   void Assign(U&& value) {
     if (ok()) {
