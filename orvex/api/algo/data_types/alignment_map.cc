@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "orvex/api/algo/data_types/data_kernels.h"
+#include "orvex/api/memory/allocation_spec.h"
 #include "orvex/status/log.h"
 #include "orvex/status/status_builder.h"
 #include "orvex/status/status_macros.h"
@@ -24,12 +25,8 @@ int32_t StrideFor(int32_t blocks) {
   return static_cast<int32_t>((int64_t{kAlignMapBytesPerPixel} * blocks + 31) / 32 * 8);
 }
 
-// The output buffer for unpacked values when the caller gave none.
-StatusOr<std::shared_ptr<Buffer>> AllocateOutput(Allocator* allocator, uint64_t size) {
-  (void)allocator;
-  return UnimplementedErrorBuilder(ORVEX_LOC)
-         << "No allocation interface for an output of " << size << " bytes";
-}
+// Allocation flags of unpacked outputs, passed through to the allocator.
+constexpr AllocationSpec::Flags kUnpackAllocationFlags = 32;
 
 template <typename Out, size_t kPerWord>
 void UnpackChunked(const unsigned char* in, uint64_t words, unsigned char* out,
@@ -106,10 +103,16 @@ StatusOr<std::unique_ptr<Buffer::MappedHandle>> AlignmentMap::Unpack(
   const uint64_t required = vectors ? words * 2 * sizeof(int32_t) : words;
 
   if (output == nullptr) {
+    // Allocation needs an allocator and a non-empty size.
     if (allocator == nullptr) {
       return InvalidArgumentErrorBuilder(ORVEX_LOC) << "No allocator for the unpacked output";
     }
-    StatusOr<std::shared_ptr<Buffer>> allocated = AllocateOutput(allocator, required);
+    if (required == 0) {
+      return InvalidArgumentErrorBuilder(ORVEX_LOC)
+             << "Nothing to unpack: the alignment map is empty";
+    }
+    StatusOr<std::shared_ptr<Buffer>> allocated =
+        Buffer::Allocate(allocator, required, kUnpackAllocationFlags, FenceType::kDummy);
     if (!allocated.ok()) {
       return StatusBuilder(allocated.status(), ORVEX_LOC)
              << (vectors ? "Error allocating image for motion vectors."

@@ -62,8 +62,9 @@ class ORVEX_EXPORT AlignmentMap {
 
   // Unpacks each word i into int32 elements 2i and 2i + 1 of `output`
   // (N * 8 bytes for N = packed size / 4 words). When `output` is empty it
-  // is allocated from `allocator` and stored there (and kept even if a later
-  // step fails). Every byte of `output` past the unpacked values is zeroed.
+  // is allocated from `allocator` (flags 32, a dummy fence) and stored there
+  // (and kept even if a later step fails); INVALID_ARGUMENT when there is no
+  // allocator or nothing to unpack. Every byte of `output` past the unpacked values is zeroed.
   // Returns the read-write mapping of the whole output, or:
   // FAILED_PRECONDITION when the packed buffer is not mapped; the
   // allocator's error annotated "Error allocating image for motion

@@ -8,8 +8,10 @@
 
 #include "gmock/gmock.h"
 #include "gtest/gtest.h"
+#include "orvex/api/memory/allocation_spec.h"
 #include "orvex/api/memory/buffer_testing.h"
 #include "orvex/api/memory/buffer_views.h"
+#include "orvex/api/memory/heap_allocator.h"
 #include "orvex/api/memory/hw_buffer.h"
 #include "orvex/status/status_matchers.h"
 
@@ -128,12 +130,83 @@ TEST(AlignmentMapTest, OutputSizes) {
   }
 }
 
+// Hands out what a test gives it and records the requests.
+class ScriptedAllocator : public Allocator {
+ public:
+  explicit ScriptedAllocator(StatusOr<std::shared_ptr<Buffer>> result)
+      : result_(std::move(result)) {}
+  StatusOr<Allocation> Allocate(const AllocationSpec& spec) override {
+    specs.push_back(spec.DebugStr());
+    if (!result_.ok()) return result_.status();
+    return Allocation({*result_});
+  }
+  uint64_t GetAllocatedBytes() const override { return 0; }
+  std::string DebugStr() const override { return "{type: ScriptedAllocator}"; }
+
+  std::vector<std::string> specs;
+
+ private:
+  StatusOr<std::shared_ptr<Buffer>> result_;
+};
+
+TEST(AlignmentMapTest, AllocatesMissingOutputs) {
+  auto map = AlignmentMap::Make({64, 64}, Packed(100, {0x7FF00000, 0x000FFF80}));
+  HeapAllocator heap(FenceType::kSoftware);
+  std::shared_ptr<Buffer> vectors;
+  std::shared_ptr<Buffer> errors;
+  auto mv = map->UnpackMotionVectors(&heap, vectors);
+  auto me = map->UnpackMatchingErrors(&heap, errors);
+  ASSERT_THAT(mv.status(), IsOk());
+  ASSERT_THAT(me.status(), IsOk());
+  ASSERT_NE(vectors, nullptr);
+  ASSERT_NE(errors, nullptr);
+  EXPECT_EQ(vectors->GetSize(), 200u);
+  EXPECT_EQ(errors->GetSize(), 25u);
+  EXPECT_EQ((*mv)->buffer(), vectors);
+  // Dummy fences, whatever the allocator's default kind: done at once.
+  EXPECT_TRUE(std::holds_alternative<Status>(vectors->WaitForDone(absl::ZeroDuration())));
+  std::vector<int32_t> want = {2047, 0, 0, -1};
+  want.resize(50, 0);
+  EXPECT_EQ(Read<int32_t>(**mv), want);
+  EXPECT_EQ(Read<uint8_t>(**me)[1], 0x80);
+
+  ScriptedAllocator failing(ResourceExhaustedError("pool empty"));
+  std::shared_ptr<Buffer> none;
+  EXPECT_THAT(map->UnpackMotionVectors(&failing, none),
+              StatusIs(StatusCode::kResourceExhausted,
+                       "pool empty; Error allocating image for motion vectors."));
+  EXPECT_THAT(map->UnpackMatchingErrors(&failing, none),
+              StatusIs(StatusCode::kResourceExhausted,
+                       "pool empty; Error allocating image for matching errors."));
+  EXPECT_EQ(none, nullptr);
+  EXPECT_THAT(failing.specs, ::testing::ElementsAre("{type: AllocationSpec, size: 200, flags: 32}",
+                                                    "{type: AllocationSpec, size: 25, flags: 32}"));
+
+  // A buffer that a later step refuses stays with the caller; one smaller
+  // than asked for is never written.
+  ScriptedAllocator placeholder(
+      std::shared_ptr<Buffer>(VirtualBuffer::Make(200, BufferAttributes{}, nullptr).value()));
+  EXPECT_THAT(map->UnpackMotionVectors(&placeholder, none),
+              StatusIs(StatusCode::kUnimplemented, HasSubstr("VirtualBuffers are not mappable")));
+  EXPECT_NE(none, nullptr);
+  ScriptedAllocator short_buffer(std::shared_ptr<Buffer>(Output(24)));
+  std::shared_ptr<Buffer> small;
+  EXPECT_THAT(map->UnpackMatchingErrors(&short_buffer, small),
+              StatusIs(StatusCode::kInvalidArgument,
+                       "Motion vector buffer is not big enough, need 25 given 24"));
+}
+
 TEST(AlignmentMapTest, ErrorsOfTheOutput) {
   auto map = AlignmentMap::Make({64, 64}, Packed(32, {}));
   std::shared_ptr<Buffer> none;
   EXPECT_THAT(map->UnpackMotionVectors(nullptr, none),
               StatusIs(StatusCode::kInvalidArgument, "No allocator for the unpacked output"));
   EXPECT_EQ(none, nullptr);
+  HeapAllocator heap;
+  auto empty = AlignmentMap::Make({0, 0}, Packed(0, {}));
+  EXPECT_THAT(
+      empty->UnpackMotionVectors(&heap, none),
+      StatusIs(StatusCode::kInvalidArgument, "Nothing to unpack: the alignment map is empty"));
   // A mapping failure of the output comes back unchanged.
   std::shared_ptr<Buffer> placeholder =
       VirtualBuffer::Make(64, BufferAttributes{}, nullptr).value();
