@@ -249,9 +249,25 @@ TEST(LocalToneMappingDeathTest, ContractViolations) {
   data->SetIdentity();
   EXPECT_DEATH((void)data->GetGlobalToneMap(4, nullptr),
                "Check failed: gain_lut != nullptr \\(gain_lut=\\(null\\), nullptr=\\(null\\)\\) ");
-  data->grid->desc.stride_y = 400;
-  EXPECT_DEATH(data->SetIdentity(),
-               "Check failed: GridLayoutFits\\(d\\) grid layout does not fit its storage");
+  // SetIdentity writes through the descriptions, so they must be sound.
+  const struct {
+    std::function<void(LocalToneMappingDataV1&)> spoil;
+    const char* text;
+  } cases[] = {
+      {[](auto& d) { d.grid.reset(); }, "Check failed: grid != nullptr && guide_curve != nullptr "},
+      {[](auto& d) { d.grid->desc.stride_y = 400; },
+       "Check failed: GridLayoutFits\\(d\\) grid layout does not fit its storage"},
+      {[](auto& d) { d.guide_curve->desc.entry_size = 8; },
+       "Check failed: guide_curve->desc.entry_size == 4 && guide_curve->desc.num_entries >= 0 "},
+      {[](auto& d) { d.guide_curve = std::make_shared<MissingCurve>(); },
+       "Check failed: base != nullptr && curve != nullptr "},
+  };
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.text);
+    auto spoilt = MakeData();
+    c.spoil(*spoilt);
+    EXPECT_DEATH(spoilt->SetIdentity(), c.text);
+  }
 }
 
 }  // namespace
