@@ -9,6 +9,7 @@ packages=(
   libabsl-dev libfmt-dev
   libprotobuf-dev protobuf-compiler
   libgtest-dev libgmock-dev libbenchmark-dev
+  libhwy-dev
 )
 # Extra package groups, chosen with arguments: "asan"/"tsan" need nothing
 # beyond g++; "clang" adds the compiler and runtime for fuzzing.
