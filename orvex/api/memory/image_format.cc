@@ -1,0 +1,1121 @@
+#include "orvex/api/memory/image_format.h"
+
+#include <array>
+#include <climits>
+#include <string_view>
+#include <utility>
+
+#include "orvex/api/math/size_utils.h"
+#include "orvex/api/memory/afbc_size_utils.h"
+#include "orvex/api/memory/sbwc_size_utils.h"
+#include "orvex/status/status_builder.h"
+
+namespace orvex {
+namespace {
+
+using Content = ImageFormat::ComponentContent;
+using Subsampling = ImageFormat::ChromaSubsampling;
+using Order = ImageFormat::InterleavedChromaOrder;
+using F = HalPixelFormat;
+
+// Layout families of Make.
+enum class Family {
+  kSemiPlanar420,
+  kYv12,
+  kInterleaved422,
+  kMonochrome,
+  kRawBayer,
+  kBlob,
+  kSbwcBayerLossless,
+  kSbwcBayerLossy,
+  kSbwcYuvLossless,
+  kSbwcYuvLossy,
+  kAfbcWideBlock,
+  kAfbcExtraWideBlock,
+};
+
+std::optional<Family> FamilyOf(HalPixelFormat format) {
+  switch (format) {
+    case F::YCBCR_420_888:
+    case F::YCBCR_P010:
+    case F::YCBCR_420_SP_M:
+    case F::YCBCR_420_SP_M_S10B:
+    case F::YCBCR_P010_M:
+    case F::YCBCR_420_888_SINGLE_BUFFER:
+    case F::YCBCR_420_888_STRIDE_ALIGNED_64:
+    case F::YCBCR_420_SP_M_STRIDE_ALIGNED_64:
+    case F::YCBCR_420_SP_M_S10B_STRIDE_ALIGNED_64:
+    case F::YCBCR_420_888_SINGLE_BUFFER_STRIDE_ALIGNED_64:
+    case F::YCBCR_P010_M_STRIDE_ALIGNED_64:
+      return Family::kSemiPlanar420;
+    case F::YV12:
+      return Family::kYv12;
+    case F::YCBCR_422_I:
+      return Family::kInterleaved422;
+    case F::Y8:
+    case F::Y16:
+    case F::Y10:
+      return Family::kMonochrome;
+    case F::RAW16:
+    case F::RAW10:
+    case F::RAW12:
+      return Family::kRawBayer;
+    case F::BLOB:
+      return Family::kBlob;
+    case F::RAW16_BAYER_SBWC:
+      return Family::kSbwcBayerLossless;
+    case F::RAW16_BAYER_SBWC_L50:
+    case F::RAW16_BAYER_SBWC_L75:
+      return Family::kSbwcBayerLossy;
+    case F::YCBCR_420_SP_M_SBWC:
+    case F::YCBCR_420_SP_M_S10B_SBWC:
+    case F::YCRCB_420_SP_M_SBWC:
+    case F::YCBCR_420_SP_M_SBWC_STRIDE_ALIGNED_64:
+    case F::YCBCR_420_SP_M_S10B_SBWC_STRIDE_ALIGNED_64:
+      return Family::kSbwcYuvLossless;
+    case F::YCBCR_420_SP_M_SBWC_L50:
+    case F::YCBCR_420_SP_M_SBWC_L75:
+    case F::YCBCR_420_SP_M_S10B_SBWC_L40:
+    case F::YCBCR_420_SP_M_S10B_SBWC_L60:
+    case F::YCBCR_420_SP_M_S10B_SBWC_L80:
+    case F::YCBCR_420_SP_M_SBWC_L50_STRIDE_ALIGNED_64:
+    case F::YCBCR_420_SP_M_S10B_SBWC_L40_STRIDE_ALIGNED_64:
+    case F::YCBCR_420_SP_M_S10B_SBWC_L80_STRIDE_ALIGNED_64:
+      return Family::kSbwcYuvLossy;
+    case F::YCBCR_420_888_I_AFBC_WIDEBLK:
+      return Family::kAfbcWideBlock;
+    case F::YCBCR_420_888_AFBC_EXTRAWIDEBLK:
+      return Family::kAfbcExtraWideBlock;
+    default:
+      return std::nullopt;
+  }
+}
+
+// Lossy SBWC YUV parameters: compression ratio and payload alignment.
+struct LossyYuvParams {
+  int ratio;
+  int alignment;
+};
+
+LossyYuvParams LossyYuvParamsOf(HalPixelFormat format) {
+  switch (format) {
+    case F::YCBCR_420_SP_M_SBWC_L50:
+      return {50, 32};
+    case F::YCBCR_420_SP_M_SBWC_L75:
+      return {75, 32};
+    case F::YCBCR_420_SP_M_S10B_SBWC_L40:
+      return {40, 32};
+    case F::YCBCR_420_SP_M_S10B_SBWC_L60:
+      return {60, 32};
+    case F::YCBCR_420_SP_M_S10B_SBWC_L80:
+      return {80, 32};
+    case F::YCBCR_420_SP_M_SBWC_L50_STRIDE_ALIGNED_64:
+      return {50, 64};
+    case F::YCBCR_420_SP_M_S10B_SBWC_L40_STRIDE_ALIGNED_64:
+      return {40, 64};
+    default:  // YCBCR_420_SP_M_S10B_SBWC_L80_STRIDE_ALIGNED_64
+      return {80, 64};
+  }
+}
+
+struct FamilyRules {
+  int width_multiple;
+  int height_multiple;
+  bool accepts_order;
+};
+
+FamilyRules RulesOf(Family family, HalPixelFormat format) {
+  switch (family) {
+    case Family::kSemiPlanar420:
+      return {2, 2, true};
+    case Family::kYv12:
+      return {4, 2, false};
+    case Family::kInterleaved422:
+      return {2, 1, true};
+    case Family::kMonochrome:
+      return {2, 2, false};
+    case Family::kRawBayer:
+      return {format == F::RAW16 ? 2 : 4, 1, false};
+    case Family::kBlob:
+      return {1, 1, false};
+    case Family::kSbwcBayerLossless:
+    case Family::kSbwcBayerLossy:
+      return {2, 2, false};
+    case Family::kSbwcYuvLossless:
+    case Family::kSbwcYuvLossy:
+    case Family::kAfbcWideBlock:
+    case Family::kAfbcExtraWideBlock:
+      return {2, 2, true};
+  }
+  return {2, 2, false};
+}
+
+std::string DimensionMessage(Family family, HalPixelFormat format, int bpp) {
+  switch (family) {
+    case Family::kSemiPlanar420:
+      return "YCBCR_420_888 dimension requirements not met";
+    case Family::kYv12:
+      return "YV12 dimension requirements not met";
+    case Family::kInterleaved422:
+      return "YCBCR_422_I dimension requirements not met";
+    case Family::kMonochrome:
+      return "Monochrome format dimension requirements not met";
+    case Family::kRawBayer:
+      return "Dimension requirements not met for RAW" + std::to_string(bpp);
+    case Family::kBlob:
+      return "";
+    case Family::kSbwcBayerLossless:
+      return "RAW16_BAYER_SBWC dimension requirements not met";
+    case Family::kSbwcYuvLossless:
+      return "YCBCR_420_SP_M_SBWC dimension requirements not met";
+    case Family::kSbwcBayerLossy:
+    case Family::kSbwcYuvLossy:
+      return FormatToString(format) + " dimension requirements not met";
+    case Family::kAfbcWideBlock:
+      return "YCBCR_420_888_I_AFBC dimension requirements not met";
+    case Family::kAfbcExtraWideBlock:
+      return "YCBCR_420_888_AFBC dimension requirements not met";
+  }
+  return "";
+}
+
+// Appends the multiple-of text of one dimension; returns whether it failed.
+bool CheckMultiple(std::string_view name, int value, int multiple, bool verbose,
+                   StatusBuilder& builder) {
+  // A zero multiple counts as quotient 0, so the whole value is the rest.
+  const int64_t quotient = multiple == 0 ? 0 : int64_t{value} / multiple;
+  const int64_t remainder = int64_t{value} - quotient * multiple;
+  if (remainder == 0) return false;
+  if (verbose) {
+    builder << "image " << name << " should be a multiple of " << multiple << ", " << value << " % "
+            << multiple << " = " << remainder;
+  }
+  return true;
+}
+
+// OK when width and height are multiples of the given numbers; otherwise
+// INVALID_ARGUMENT naming each failing dimension (no separator between the
+// two texts).
+Status CheckDimensionsValid(int width, int height, int width_multiple, int height_multiple,
+                            bool verbose) {
+  StatusBuilder builder = InvalidArgumentErrorBuilder(ORVEX_LOC);
+  const bool width_failed = CheckMultiple("width", width, width_multiple, verbose, builder);
+  const bool height_failed = CheckMultiple("height", height, height_multiple, verbose, builder);
+  if (!width_failed && !height_failed) return OkStatus();
+  return builder;
+}
+
+// A component under construction, with 64-bit fields so that sizes that do
+// not fit the component's int fields are detected instead of wrapped.
+struct DraftComponent {
+  Content content;
+  int buffer_index;
+  uint64_t offset_bytes;
+  int64_t width;
+  int64_t height;
+  int64_t row_stride_bytes;
+  int bits_per_pixel;
+  int pixel_stride = 1;
+  int pixel_phase = 0;
+};
+
+struct Draft {
+  std::array<uint64_t, 2> buffer_sizes{};
+  int buffer_count = 0;
+  std::array<DraftComponent, 4> components{};
+  int component_count = 0;
+  std::optional<Subsampling> chroma_subsampling;
+  // Order used when Make is given none; empty for formats without one.
+  std::optional<Order> default_order;
+
+  void AddBuffer(uint64_t size) { buffer_sizes[static_cast<size_t>(buffer_count++)] = size; }
+  void Add(const DraftComponent& c) { components[static_cast<size_t>(component_count++)] = c; }
+};
+
+constexpr uint64_t U(int64_t v) { return static_cast<uint64_t>(v); }
+
+int64_t AlignUp(int64_t value, size_t alignment) { return AlignToPower2Signed(value, alignment); }
+
+bool IsOneOf(HalPixelFormat format, std::initializer_list<HalPixelFormat> formats) {
+  for (const HalPixelFormat f : formats) {
+    if (f == format) return true;
+  }
+  return false;
+}
+
+void LayOutSemiPlanar420(HalPixelFormat format, int64_t w, int64_t h, int bpp, Draft& d) {
+  int64_t stride = AlignUp((bpp * w) / 8, 16);
+  if (IsOneOf(format, {F::YCBCR_420_888_STRIDE_ALIGNED_64, F::YCBCR_420_SP_M_STRIDE_ALIGNED_64,
+                       F::YCBCR_420_SP_M_S10B_STRIDE_ALIGNED_64,
+                       F::YCBCR_420_888_SINGLE_BUFFER_STRIDE_ALIGNED_64,
+                       F::YCBCR_P010_M_STRIDE_ALIGNED_64})) {
+    stride = AlignUp(stride, 64);
+  } else if (format == F::YCBCR_P010_M) {
+    stride = AlignUp(stride, 32);
+  }
+  const uint64_t luma_size = U(h) * U(stride);
+  const uint64_t chroma_size = luma_size / 2;
+  int chroma_buffer = 1;
+  uint64_t chroma_offset = 0;
+  if (IsOneOf(format, {F::YCBCR_P010, F::YCBCR_420_888_SINGLE_BUFFER,
+                       F::YCBCR_420_888_SINGLE_BUFFER_STRIDE_ALIGNED_64})) {
+    d.AddBuffer(luma_size + chroma_size);
+    chroma_buffer = 0;
+    chroma_offset = luma_size;
+  } else {
+    d.AddBuffer(luma_size);
+    d.AddBuffer(chroma_size);
+  }
+  d.default_order =
+      IsOneOf(format, {F::YCBCR_P010, F::YCBCR_420_SP_M, F::YCBCR_P010_M,
+                       F::YCBCR_420_SP_M_STRIDE_ALIGNED_64, F::YCBCR_P010_M_STRIDE_ALIGNED_64})
+          ? Order::kCbCr
+          : Order::kCrCb;
+  d.Add({Content::kLuma, 0, 0, w, h, stride, bpp, 1, 0});
+  // Phases are fixed in Make once the order is known.
+  d.Add({Content::kChromaB, chroma_buffer, chroma_offset, w / 2, h / 2, stride, bpp, 2, 0});
+  d.Add({Content::kChromaR, chroma_buffer, chroma_offset, w / 2, h / 2, stride, bpp, 2, 0});
+  d.chroma_subsampling = Subsampling::k420;
+}
+
+void LayOutYv12(int64_t w, int64_t h, Draft& d) {
+  const int64_t luma_stride = AlignUp(w, 16);
+  const int64_t chroma_stride = AlignUp(luma_stride / 2, 16);
+  const uint64_t luma_size = U(h) * U(luma_stride);
+  const uint64_t chroma_size = (U(h) * U(chroma_stride)) / 2;
+  d.AddBuffer(luma_size + 2 * chroma_size);
+  d.Add({Content::kLuma, 0, 0, w, h, luma_stride, 8});
+  d.Add({Content::kChromaR, 0, luma_size, w / 2, h / 2, chroma_stride, 8});
+  d.Add({Content::kChromaB, 0, luma_size + chroma_size, w / 2, h / 2, chroma_stride, 8});
+  d.chroma_subsampling = Subsampling::k420;
+}
+
+void LayOutInterleaved422(int64_t w, int64_t h, int bpp, Draft& d) {
+  const int64_t stride = AlignUp(2 * w, 16);
+  d.AddBuffer(U(h) * U(stride));
+  d.Add({Content::kLuma, 0, 0, w, h, stride, bpp, 2, 0});
+  d.Add({Content::kChromaB, 0, 0, w / 2, h, stride, bpp, 4, 1});
+  d.Add({Content::kChromaR, 0, 0, w / 2, h, stride, bpp, 4, 3});
+  d.chroma_subsampling = Subsampling::k422;
+  d.default_order = Order::kCrCb;
+}
+
+void LayOutMonochrome(HalPixelFormat format, int64_t w, int64_t h, int bpp, Draft& d) {
+  int64_t stride = 0;
+  if (format == F::Y8) {
+    stride = AlignUp(w, 16);
+  } else if (format == F::Y16) {
+    stride = AlignUp(2 * w, 32);
+  } else {  // Y10: packed, four samples in five bytes
+    stride = (5 * w) / 4;
+  }
+  d.AddBuffer(U(h) * U(stride));
+  d.Add({Content::kLuma, 0, 0, w, h, stride, bpp, 1, 0});
+}
+
+void LayOutRawBayer(int64_t w, int64_t h, int bpp, Draft& d) {
+  const int64_t stride = (bpp * w) / 8;
+  d.AddBuffer(U(h) * U(stride));
+  d.Add({Content::kBayer, 0, 0, w, h, stride, bpp, 1, 0});
+}
+
+void LayOutBlob(int64_t w, int64_t h, Draft& d) {
+  d.AddBuffer(U(w) * U(h));
+  d.Add({Content::kUnspecified, 0, 0, w, h, w, 8, 1, 0});
+}
+
+void LayOutSbwcBayerLossless(int width, int64_t h, int bpp, Draft& d) {
+  const int64_t blocks = CeilDiv(width, 256);
+  // Half a byte of header per 256x1 block, rows padded to 64 bytes.
+  const int64_t header_stride = AlignUp(CeilDiv(blocks, 2), 64);
+  const uint64_t header_size = U(header_stride) * U(h);
+  const auto payload_stride =
+      static_cast<int64_t>(sbwc_size_utils::GetPayloadStride<256, 1>(width, bpp, 64));
+  d.AddBuffer(header_size + U(payload_stride) * U(h));
+  d.Add({Content::kCompressedBayerHeader, 0, 0, header_stride, h, header_stride, bpp});
+  d.Add({Content::kCompressedBayerPayload, 0, header_size, payload_stride, h, payload_stride, bpp});
+}
+
+void LayOutSbwcBayerLossy(HalPixelFormat format, int width, int64_t h, int bpp, Draft& d) {
+  const int ratio = format == F::RAW16_BAYER_SBWC_L50 ? 50 : 75;
+  const int64_t stride = sbwc_size_utils::detail::LossyBayerPayloadStride(width, bpp, 32, ratio);
+  d.AddBuffer(U(stride) * U(h));
+  d.Add({Content::kCompressedBayerPayload, 0, 0, stride, h, stride, bpp});
+}
+
+void LayOutSbwcYuvLossless(HalPixelFormat format, int width, int height, int bpp, Draft& d) {
+  const int64_t w = width;
+  const int64_t h = height;
+  const bool aligned_64 = format == F::YCBCR_420_SP_M_SBWC_STRIDE_ALIGNED_64 ||
+                          format == F::YCBCR_420_SP_M_S10B_SBWC_STRIDE_ALIGNED_64;
+  const int header_alignment = aligned_64 ? 64 : 16;
+  const bool ten_bit = bpp == 10;
+  // Blocks of 32x4 luma samples.
+  const int64_t header_stride = AlignUp(CeilDiv(w, 64), static_cast<size_t>(header_alignment));
+  const int64_t payload_stride = CeilDiv(w, 32) * (ten_bit ? 192 : 128);
+  const int64_t rows = AlignUp(h, ten_bit ? 8 : 16);
+  const uint64_t luma_payload = U(payload_stride) * U(rows / 4) + 64;
+  const auto luma_header = U(sbwc_size_utils::detail::YHeaderSize(width, height, header_alignment));
+  const uint64_t chroma_payload = U(payload_stride) * U(rows / 8) + 64;
+  const auto chroma_header =
+      U(sbwc_size_utils::detail::UVHeaderSize(width, height, header_alignment));
+  d.AddBuffer(luma_payload + luma_header);
+  d.AddBuffer(chroma_payload + chroma_header);
+  const int64_t luma_rows = CeilDiv(h, 4);
+  const int64_t chroma_rows = CeilDiv(h / 2, 4);
+  d.Add({Content::kCompressedLumaHeader, 0, luma_payload, header_stride, luma_rows, header_stride,
+         bpp});
+  d.Add({Content::kCompressedLumaPayload, 0, 0, payload_stride, luma_rows, payload_stride, bpp});
+  d.Add({Content::kCompressedChromaHeader, 1, chroma_payload, header_stride, chroma_rows,
+         header_stride, bpp});
+  d.Add(
+      {Content::kCompressedChromaPayload, 1, 0, payload_stride, chroma_rows, payload_stride, bpp});
+  d.chroma_subsampling = Subsampling::k420;
+  d.default_order = Order::kCbCr;
+}
+
+void LayOutSbwcYuvLossy(HalPixelFormat format, int width, int64_t h, int bpp, Draft& d) {
+  const LossyYuvParams params = LossyYuvParamsOf(format);
+  const int64_t stride =
+      sbwc_size_utils::detail::LossyYuvPayloadStride(width, bpp, params.alignment, params.ratio);
+  const int64_t rows = AlignUp(h, 16);
+  d.AddBuffer(U(stride) * U(rows / 4) + 64);
+  d.AddBuffer(U(stride) * U(rows / 8) + 64);
+  d.Add({Content::kCompressedLumaPayload, 0, 0, stride, CeilDiv(h, 4), stride, bpp});
+  d.Add({Content::kCompressedChromaPayload, 1, 0, stride, CeilDiv(h / 2, 4), stride, bpp});
+  d.chroma_subsampling = Subsampling::k420;
+  d.default_order = Order::kCbCr;
+}
+
+// Header and payload geometry of one AFBC plane.
+struct AfbcPlane {
+  int64_t header_width;
+  int64_t header_stride;
+  int64_t header_height;
+  uint64_t header_size;
+  int64_t payload_width;
+  int64_t payload_stride;
+  int64_t payload_height;
+};
+
+AfbcPlane LayOutAfbcPlane(HalPixelFormat format, int64_t w, int64_t h, int64_t payload_bits) {
+  namespace afbc = afbc_size_utils::detail;
+  AfbcPlane p{};
+  p.header_width = afbc::HeaderWidth(format, w);
+  p.header_stride = afbc::HeaderStride(p.header_width);
+  p.header_height = afbc::HeaderHeight(format, h);
+  p.header_size = afbc_size_utils::AlignBufferSize(format, U(p.header_height) * U(p.header_stride));
+  p.payload_width = afbc::PayloadWidth(format, w);
+  p.payload_stride = afbc::PayloadStride(p.payload_width, payload_bits);
+  p.payload_height = afbc::PayloadHeight(format, h);
+  return p;
+}
+
+// Luma and chroma share the superblocks: one header area, one payload area.
+void LayOutAfbcWideBlock(HalPixelFormat format, int64_t w, int64_t h, int bpp, Draft& d) {
+  const AfbcPlane p = LayOutAfbcPlane(format, w, h, (bpp * 3) / 2);
+  d.AddBuffer(p.header_size + U(p.payload_height) * U(p.payload_stride));
+  d.Add({Content::kCompressedLumaHeader, 0, 0, p.header_width, p.header_height, p.header_stride,
+         bpp});
+  d.Add({Content::kCompressedLumaPayload, 0, p.header_size, p.payload_width, p.payload_height,
+         p.payload_stride, bpp});
+  d.Add({Content::kCompressedChromaHeader, 0, 0, p.header_width, p.header_height, p.header_stride,
+         bpp});
+  d.Add({Content::kCompressedChromaPayload, 0, p.header_size, p.payload_width / 2,
+         p.payload_height / 2, p.payload_stride, bpp});
+  d.chroma_subsampling = Subsampling::k420;
+  d.default_order = Order::kCrCb;
+}
+
+// Luma plane in buffer 0, interleaved chroma plane (a Cb-Cr pair counts as
+// one sample of twice the bits) in buffer 1, each header then payload.
+void LayOutAfbcExtraWideBlock(HalPixelFormat format, int64_t w, int64_t h, int bpp, Draft& d) {
+  const AfbcPlane luma = LayOutAfbcPlane(format, w, h, bpp);
+  const AfbcPlane chroma = LayOutAfbcPlane(format, w / 2, h / 2, 2 * int64_t{bpp});
+  for (const AfbcPlane* p : {&luma, &chroma}) {
+    const uint64_t payload_size =
+        afbc_size_utils::AlignBufferSize(format, U(p->payload_height) * U(p->payload_stride));
+    d.AddBuffer(p->header_size + payload_size);
+  }
+  d.Add({Content::kCompressedLumaHeader, 0, 0, luma.header_width, luma.header_height,
+         luma.header_stride, bpp});
+  d.Add({Content::kCompressedLumaPayload, 0, luma.header_size, luma.payload_width,
+         luma.payload_height, luma.payload_stride, bpp});
+  d.Add({Content::kCompressedChromaHeader, 1, 0, chroma.header_width, chroma.header_height,
+         chroma.header_stride, bpp});
+  d.Add({Content::kCompressedChromaPayload, 1, chroma.header_size, chroma.payload_width,
+         chroma.payload_height, chroma.payload_stride, bpp});
+  d.chroma_subsampling = Subsampling::k420;
+  d.default_order = Order::kCrCb;
+}
+
+bool FitsInt(int64_t v) { return v >= INT_MIN && v <= INT_MAX; }
+
+}  // namespace
+
+ImageFormat::ImageFormat(HalPixelFormat format, int width, int height,
+                         std::vector<size_t> buffer_sizes, std::vector<Component> components,
+                         std::optional<ChromaSubsampling> chroma_subsampling,
+                         std::optional<InterleavedChromaOrder> interleaved_chroma_order)
+    : format_(format),
+      width_(width),
+      height_(height),
+      buffer_sizes_(std::move(buffer_sizes)),
+      components_(std::move(components)),
+      chroma_subsampling_(chroma_subsampling),
+      interleaved_chroma_order_(interleaved_chroma_order) {}
+
+StatusOr<ImageFormat> ImageFormat::Make(
+    int width, int height, HalPixelFormat format,
+    std::optional<InterleavedChromaOrder> interleaved_chroma_order) {
+  if (format == F::IMPLEMENTATION_DEFINED) {
+    format = F::YCBCR_420_888;
+  } else if (format == F::IMPLEMENTATION_DEFINED_64) {
+    format = F::YCBCR_420_888_STRIDE_ALIGNED_64;
+  }
+  const int bpp = BitsPerPixel(format);
+  const std::optional<Family> family = FamilyOf(format);
+  if (!family.has_value()) {
+    return UnimplementedErrorBuilder(ORVEX_LOC)
+           << "Unsupported HalPixelFormat: " << FormatToString(format)
+           << ", unable to make ImageFormat.";
+  }
+  if (*family == Family::kInterleaved422 && interleaved_chroma_order.has_value() &&
+      *interleaved_chroma_order != Order::kCrCb) {
+    return UnimplementedErrorBuilder(ORVEX_LOC)
+           << "Unsupported interleaved chroma order: "
+           << InterleavedChromaOrderToString(*interleaved_chroma_order)
+           << " for HalPixelFormat: YCBCR_422_I, unable to make ImageFormat.";
+  }
+  const FamilyRules rules = RulesOf(*family, format);
+  if (*family != Family::kBlob) {
+    Status dimensions = CheckDimensionsValid(width, height, rules.width_multiple,
+                                             rules.height_multiple, /*verbose=*/true);
+    if (!dimensions.ok()) {
+      return StatusBuilder(std::move(dimensions), ORVEX_LOC)
+             << DimensionMessage(*family, format, bpp);
+    }
+  }
+  // Negative sizes would give negative strides and wrapped buffer sizes.
+  if (width < 0 || height < 0) {
+    return InvalidArgumentErrorBuilder(ORVEX_LOC)
+           << "Invalid image size " << width << "x" << height
+           << " for HalPixelFormat: " << FormatToString(format)
+           << ", width and height must not be negative";
+  }
+
+  Draft d;
+  const int64_t w = width;
+  const int64_t h = height;
+  switch (*family) {
+    case Family::kSemiPlanar420:
+      LayOutSemiPlanar420(format, w, h, bpp, d);
+      break;
+    case Family::kYv12:
+      LayOutYv12(w, h, d);
+      break;
+    case Family::kInterleaved422:
+      LayOutInterleaved422(w, h, bpp, d);
+      break;
+    case Family::kMonochrome:
+      LayOutMonochrome(format, w, h, bpp, d);
+      break;
+    case Family::kRawBayer:
+      LayOutRawBayer(w, h, bpp, d);
+      break;
+    case Family::kBlob:
+      LayOutBlob(w, h, d);
+      break;
+    case Family::kSbwcBayerLossless:
+      LayOutSbwcBayerLossless(width, h, bpp, d);
+      break;
+    case Family::kSbwcBayerLossy:
+      LayOutSbwcBayerLossy(format, width, h, bpp, d);
+      break;
+    case Family::kSbwcYuvLossless:
+      LayOutSbwcYuvLossless(format, width, height, bpp, d);
+      break;
+    case Family::kSbwcYuvLossy:
+      LayOutSbwcYuvLossy(format, width, h, bpp, d);
+      break;
+    case Family::kAfbcWideBlock:
+      LayOutAfbcWideBlock(format, w, h, bpp, d);
+      break;
+    case Family::kAfbcExtraWideBlock:
+      LayOutAfbcExtraWideBlock(format, w, h, bpp, d);
+      break;
+  }
+
+  // Every stride and extent must fit the component's int fields; when they
+  // do, the 64-bit buffer sizes computed from them are exact.
+  std::vector<Component> components;
+  components.reserve(static_cast<size_t>(d.component_count));
+  for (int i = 0; i < d.component_count; ++i) {
+    const DraftComponent& c = d.components[static_cast<size_t>(i)];
+    if (!FitsInt(c.width) || !FitsInt(c.height) || !FitsInt(c.row_stride_bytes)) {
+      return InvalidArgumentErrorBuilder(ORVEX_LOC)
+             << "Image size " << width << "x" << height
+             << " is too large for HalPixelFormat: " << FormatToString(format)
+             << ", its row stride or extent does not fit in 32 bits";
+    }
+    components.push_back(Component{c.content, c.buffer_index, c.offset_bytes,
+                                   static_cast<int>(c.width), static_cast<int>(c.height),
+                                   static_cast<int>(c.row_stride_bytes), c.bits_per_pixel,
+                                   c.pixel_stride, c.pixel_phase});
+  }
+
+  std::optional<Order> order;
+  if (rules.accepts_order) {
+    order = interleaved_chroma_order.has_value() ? interleaved_chroma_order : d.default_order;
+  } else if (interleaved_chroma_order.has_value()) {
+    return InvalidArgumentErrorBuilder(ORVEX_LOC)
+           << "Specifying interleaved pixel order for format: " << FormatToString(format)
+           << " is not supported";
+  }
+  if (*family == Family::kSemiPlanar420) {
+    const bool cr_first = order == Order::kCrCb;
+    components[1].pixel_phase = cr_first ? 1 : 0;  // kChromaB
+    components[2].pixel_phase = cr_first ? 0 : 1;  // kChromaR
+  }
+
+  std::vector<size_t> buffer_sizes(d.buffer_sizes.begin(), d.buffer_sizes.begin() + d.buffer_count);
+  return ImageFormat(format, width, height, std::move(buffer_sizes), std::move(components),
+                     d.chroma_subsampling, order);
+}
+
+std::string ImageFormat::DebugStr() const {
+  return BuildOrvexDebugStrWithStrings("ImageFormat", {{"HalPixelFormat", FormatToString(format_)},
+                                                       {"Width", std::to_string(width_)},
+                                                       {"Height", std::to_string(height_)}});
+}
+
+std::string ImageFormat::DebugStrVerbose() const {
+  return BuildOrvexDebugStrWithStrings(
+      "ImageFormat",
+      {{"HalPixelFormat", FormatToString(format_)},
+       {"Width", std::to_string(width_)},
+       {"Height", std::to_string(height_)},
+       {"BufferSizes",
+        ContainerDebugStr(buffer_sizes_, [](size_t size) { return std::to_string(size); })},
+       {"Components", ContainerDebugStr(components_, &ImageFormat::ComponentToString)},
+       {"ChromaSubsampling", OptionalChromaSubsamplingToString(chroma_subsampling_)},
+       {"InterleavedChromaOrder",
+        OptionalInterleavedChromaOrderToString(interleaved_chroma_order_)}});
+}
+
+std::string ImageFormat::ComponentToString(const Component& component) {
+  return BuildOrvexDebugStrWithStrings(
+      "Component", {{"Content", ComponentContentToString(component.content)},
+                    {"BufferIndex", std::to_string(component.buffer_index)},
+                    {"OffsetBytes", std::to_string(component.offset_bytes)},
+                    {"Width", std::to_string(component.width)},
+                    {"Height", std::to_string(component.height)},
+                    {"RowStrideBytes", std::to_string(component.row_stride_bytes)},
+                    {"BitsPerPixel", std::to_string(component.bits_per_pixel)},
+                    {"PixelStride", std::to_string(component.pixel_stride)},
+                    {"PixelPhase", std::to_string(component.pixel_phase)}});
+}
+
+std::string ImageFormat::ComponentContentToString(ComponentContent content) {
+  static constexpr std::array<std::string_view, 15> kNames = {
+      "Unspecified",
+      "Bayer",
+      "Rgb",
+      "Red",
+      "Green",
+      "Blue",
+      "Luma",
+      "ChromaB",
+      "ChromaR",
+      "CompressedLumaHeader",
+      "CompressedLumaPayload",
+      "CompressedChromaHeader",
+      "CompressedChromaPayload",
+      "CompressedBayerHeader",
+      "CompressedBayerPayload",
+  };
+  const auto index = static_cast<uint32_t>(content);
+  return index < kNames.size() ? std::string(kNames[index]) : "Unknown";
+}
+
+std::string ImageFormat::ChromaSubsamplingToString(ChromaSubsampling subsampling) {
+  switch (subsampling) {
+    case ChromaSubsampling::k420:
+      return "420";
+    case ChromaSubsampling::k422:
+      return "422";
+    default:
+      return "444";
+  }
+}
+
+std::string ImageFormat::InterleavedChromaOrderToString(InterleavedChromaOrder order) {
+  return order == InterleavedChromaOrder::kCbCr ? "CbCr" : "CrCb";
+}
+
+std::string OptionalChromaSubsamplingToString(
+    const std::optional<ImageFormat::ChromaSubsampling>& subsampling) {
+  return subsampling.has_value() ? ImageFormat::ChromaSubsamplingToString(*subsampling) : "n/a";
+}
+
+std::string OptionalInterleavedChromaOrderToString(
+    const std::optional<ImageFormat::InterleavedChromaOrder>& order) {
+  return order.has_value() ? ImageFormat::InterleavedChromaOrderToString(*order) : "n/a";
+}
+
+// ---------------------------------------------------------------------------
+// Conformance and lookup.
+
+namespace {
+
+// Failure composition of one ConformsTo call. Rules that fail inside the
+// member give "<prefix><detail>"; failures of a called check give
+// "<callee message>; <prefix>", re-coded INVALID_ARGUMENT. Nothing is
+// composed when quiet.
+class Conformance {
+ public:
+  Conformance(bool verbose, std::string_view subject) : verbose_(verbose), subject_(subject) {}
+
+  template <typename... Pieces>
+  Status Fail(const Pieces&... pieces) const {
+    StatusBuilder builder = InvalidArgumentErrorBuilder(ORVEX_LOC);
+    if (verbose_) {
+      builder << "ImageFormat does not conform to " << subject_ << ". ";
+      (builder << ... << pieces);
+    }
+    return builder;
+  }
+
+  Status Wrap(const Status& callee) const {
+    StatusBuilder builder(Status(StatusCode::kInvalidArgument, callee.message()), ORVEX_LOC);
+    if (verbose_) builder << "ImageFormat does not conform to " << subject_ << ". ";
+    return builder;
+  }
+
+ private:
+  bool verbose_;
+  std::string_view subject_;
+};
+
+bool IsAlignedTo(int64_t value, size_t alignment) { return AlignUp(value, alignment) == value; }
+
+}  // namespace
+
+// Fetches a component for a conformance rule or returns the wrapped failure.
+#define ORVEX_CONFORMANCE_GET(var, content)                       \
+  const auto var##_or = GetComponentFor((content), verbose);      \
+  if (!var##_or.ok()) return conformance.Wrap(var##_or.status()); \
+  const Component& var = *var##_or
+
+// Returns the wrapped failure of a called check.
+#define ORVEX_CONFORMANCE_CALL(expr)                \
+  do {                                              \
+    const Status orvex_callee_status = (expr);      \
+    if (!orvex_callee_status.ok()) {                \
+      return conformance.Wrap(orvex_callee_status); \
+    }                                               \
+  } while (false)
+
+std::optional<ImageFormat::Component> ImageFormat::GetComponentForInternal(
+    ComponentContent content) const {
+  for (const Component& c : components_) {
+    if (c.content == content) return c;
+  }
+  return std::nullopt;
+}
+
+StatusOr<ImageFormat::Component> ImageFormat::GetComponentFor(ComponentContent content,
+                                                              bool verbose) const {
+  if (std::optional<Component> c = GetComponentForInternal(content)) return *c;
+  StatusBuilder builder = FailedPreconditionErrorBuilder(ORVEX_LOC);
+  if (verbose) {
+    builder << "Failed to find component with " << ComponentContentToString(content) << " in "
+            << DebugStr();
+  }
+  return builder;
+}
+
+Status ImageFormat::IsYuv(bool verbose) const {
+  const auto has = [this](ComponentContent content) {
+    return GetComponentForInternal(content).has_value();
+  };
+  const bool uncompressed = has(ComponentContent::kLuma) && has(ComponentContent::kChromaB) &&
+                            has(ComponentContent::kChromaR);
+  const bool compressed = has(ComponentContent::kCompressedLumaPayload) &&
+                          has(ComponentContent::kCompressedChromaPayload);
+  if (!uncompressed && !compressed) {
+    StatusBuilder builder = InvalidArgumentErrorBuilder(ORVEX_LOC);
+    if (verbose) {
+      builder << "Imageformat does not have required components for either compressed or "
+                 "uncompressed YUV";
+    }
+    return builder;
+  }
+  if (!chroma_subsampling_.has_value()) {
+    StatusBuilder builder = InvalidArgumentErrorBuilder(ORVEX_LOC);
+    if (verbose) {
+      builder << "ImageFormat does not contain valid YUV components. chroma_subsampling is un-set";
+    }
+    return builder;
+  }
+  return OkStatus();
+}
+
+Status ImageFormat::IsRaw(bool verbose) const {
+  for (const Component& c : components_) {
+    if (c.content == ComponentContent::kBayer ||
+        c.content == ComponentContent::kCompressedBayerPayload) {
+      return OkStatus();
+    }
+  }
+  StatusBuilder builder = InvalidArgumentErrorBuilder(ORVEX_LOC);
+  if (verbose) {
+    builder << "Imageformat does not have required components for either compressed or "
+               "uncompressed raw";
+  }
+  return builder;
+}
+
+Status ImageFormat::ConformsTo(ChromaSubsampling expected, bool verbose) const {
+  const std::string subject = verbose ? ChromaSubsamplingToString(expected) : std::string();
+  const Conformance conformance(verbose, subject);
+  if (!chroma_subsampling_.has_value() || *chroma_subsampling_ != expected) {
+    return conformance.Fail("ImageFormat's chroma subsampling reports: ",
+                            OptionalChromaSubsamplingToString(chroma_subsampling_));
+  }
+  // Compressed layouts are not measured.
+  if (GetComponentForInternal(ComponentContent::kCompressedLumaPayload).has_value() &&
+      GetComponentForInternal(ComponentContent::kCompressedChromaPayload).has_value()) {
+    return OkStatus();
+  }
+  ORVEX_CONFORMANCE_GET(luma, ComponentContent::kLuma);
+  ORVEX_CONFORMANCE_GET(cb, ComponentContent::kChromaB);
+  ORVEX_CONFORMANCE_GET(cr, ComponentContent::kChromaR);
+  int expected_width = luma.width;
+  int expected_height = luma.height;
+  if (expected == ChromaSubsampling::k422) {
+    expected_width >>= 1;
+  } else if (expected == ChromaSubsampling::k420) {
+    expected_width >>= 1;
+    expected_height >>= 1;
+  }
+  if (cb.width != expected_width) {
+    return conformance.Fail("ChromaB component width: ", cb.width,
+                            " != expected width: ", expected_width);
+  }
+  if (cr.width != expected_width) {
+    return conformance.Fail("ChromaR component width: ", cr.width,
+                            " != expected width: ", expected_width);
+  }
+  if (cb.height != expected_height) {
+    return conformance.Fail("ChromaB component height: ", cb.height,
+                            " != expected height: ", expected_height);
+  }
+  if (cr.height != expected_height) {
+    return conformance.Fail("ChromaR component height: ", cr.height,
+                            " != expected height: ", expected_height);
+  }
+  return OkStatus();
+}
+
+namespace {
+
+// Conformance rule sets, by target.
+enum class RuleSet {
+  kNone,
+  kImplementationDefined,
+  kBlob,
+  kRaw,
+  kMonochrome,
+  kSemiPlanar420,
+  kYv12,
+  kInterleaved422,
+  kSbwcBayerLossless,
+  kSbwcBayerLossy,
+  kSbwcYuvLossless,
+  kSbwcYuvLossy,
+  kAfbcExtraWideBlock,
+  kAfbcWideBlock,
+};
+
+RuleSet RuleSetOf(HalPixelFormat target) {
+  switch (target) {
+    case F::IMPLEMENTATION_DEFINED:
+      return RuleSet::kImplementationDefined;
+    case F::BLOB:
+      return RuleSet::kBlob;
+    case F::RAW16:
+    case F::RAW10:
+    case F::RAW12:
+      return RuleSet::kRaw;
+    case F::Y8:
+    case F::Y16:
+    case F::Y10:
+      return RuleSet::kMonochrome;
+    case F::YCBCR_420_888:
+    case F::YCBCR_P010:
+    case F::YCBCR_420_SP_M_S10B:
+    case F::YCBCR_P010_M:
+    case F::YCBCR_420_888_SINGLE_BUFFER:
+    case F::YCBCR_420_888_STRIDE_ALIGNED_64:
+    case F::YCBCR_420_SP_M_STRIDE_ALIGNED_64:
+    case F::YCBCR_420_SP_M_S10B_STRIDE_ALIGNED_64:
+    case F::YCBCR_420_888_SINGLE_BUFFER_STRIDE_ALIGNED_64:
+    case F::YCBCR_P010_M_STRIDE_ALIGNED_64:
+      return RuleSet::kSemiPlanar420;
+    case F::YV12:
+      return RuleSet::kYv12;
+    case F::YCBCR_422_I:
+      return RuleSet::kInterleaved422;
+    case F::RAW16_BAYER_SBWC:
+      return RuleSet::kSbwcBayerLossless;
+    case F::RAW16_BAYER_SBWC_L50:
+    case F::RAW16_BAYER_SBWC_L75:
+      return RuleSet::kSbwcBayerLossy;
+    case F::YCBCR_420_SP_M_SBWC:
+    case F::YCBCR_420_SP_M_S10B_SBWC:
+    case F::YCRCB_420_SP_M_SBWC:
+    case F::YCBCR_420_SP_M_SBWC_STRIDE_ALIGNED_64:
+    case F::YCBCR_420_SP_M_S10B_SBWC_STRIDE_ALIGNED_64:
+      return RuleSet::kSbwcYuvLossless;
+    case F::YCBCR_420_SP_M_SBWC_L50:
+    case F::YCBCR_420_SP_M_SBWC_L75:
+    case F::YCBCR_420_SP_M_S10B_SBWC_L40:
+    case F::YCBCR_420_SP_M_S10B_SBWC_L60:
+    case F::YCBCR_420_SP_M_S10B_SBWC_L80:
+    case F::YCBCR_420_SP_M_SBWC_L50_STRIDE_ALIGNED_64:
+    case F::YCBCR_420_SP_M_S10B_SBWC_L40_STRIDE_ALIGNED_64:
+    case F::YCBCR_420_SP_M_S10B_SBWC_L80_STRIDE_ALIGNED_64:
+      return RuleSet::kSbwcYuvLossy;
+    case F::YCBCR_420_888_AFBC_EXTRAWIDEBLK:
+      return RuleSet::kAfbcExtraWideBlock;
+    case F::YCBCR_420_888_I_AFBC_WIDEBLK:
+      return RuleSet::kAfbcWideBlock;
+    default:
+      return RuleSet::kNone;
+  }
+}
+
+}  // namespace
+
+Status ImageFormat::ConformsTo(HalPixelFormat target, bool verbose) const {
+  const std::string subject = verbose ? FormatToString(target) : std::string();
+  const Conformance conformance(verbose, subject);
+  const int bpp = BitsPerPixel(target);
+  for (const Component& c : components_) {
+    if (c.bits_per_pixel != bpp) {
+      StatusBuilder builder = InvalidArgumentErrorBuilder(ORVEX_LOC);
+      if (verbose) {
+        builder << "component bits per pixel: " << c.bits_per_pixel
+                << " != expected bits per pixel: " << bpp;
+      }
+      return conformance.Wrap(builder);
+    }
+  }
+
+  using CC = ComponentContent;
+  switch (RuleSetOf(target)) {
+    case RuleSet::kNone: {
+      StatusBuilder builder = UnimplementedErrorBuilder(ORVEX_LOC);
+      if (verbose) builder << "Unable to check if conforms to " << subject;
+      return builder;
+    }
+    case RuleSet::kImplementationDefined:
+      return conformance.Fail(
+          "There is no sensibe way to say if a format conforms to IMPLEMENTATION_DEFINED");
+    case RuleSet::kBlob:
+      if (GetComponentForInternal(CC::kUnspecified).has_value()) return OkStatus();
+      return conformance.Fail("BLOB should have at least 1 unspecified component");
+    case RuleSet::kRaw:
+      ORVEX_CONFORMANCE_CALL(IsRaw(verbose));
+      return OkStatus();
+    case RuleSet::kMonochrome: {
+      ORVEX_CONFORMANCE_GET(luma, CC::kLuma);
+      ORVEX_CONFORMANCE_CALL(CheckDimensionsValid(luma.width, luma.height, 2, 2, verbose));
+      const int multiple = target == F::Y8 ? 16 : target == F::Y16 ? 32 : 10;
+      if (luma.row_stride_bytes % multiple != 0) {
+        return conformance.Fail("stride must be multiple of ", multiple);
+      }
+      return OkStatus();
+    }
+    case RuleSet::kSemiPlanar420: {
+      ORVEX_CONFORMANCE_CALL(IsYuv(verbose));
+      ORVEX_CONFORMANCE_CALL(ConformsTo(ChromaSubsampling::k420, verbose));
+      ORVEX_CONFORMANCE_GET(luma, CC::kLuma);
+      ORVEX_CONFORMANCE_GET(cb, CC::kChromaB);
+      ORVEX_CONFORMANCE_GET(cr, CC::kChromaR);
+      ORVEX_CONFORMANCE_CALL(CheckDimensionsValid(luma.width, luma.height, 2, 2, verbose));
+      if (cb.buffer_index != cr.buffer_index) {
+        return conformance.Fail("chroma components should be in the same buffer");
+      }
+      if (cb.offset_bytes != cr.offset_bytes) {
+        return conformance.Fail("chroma components should start at the same offset");
+      }
+      if (IsOneOf(target, {F::YCBCR_P010, F::YCBCR_420_888_SINGLE_BUFFER,
+                           F::YCBCR_420_888_SINGLE_BUFFER_STRIDE_ALIGNED_64})) {
+        if (luma.buffer_index != cb.buffer_index) {
+          return conformance.Fail("all components should be in the same buffer");
+        }
+        const uint64_t luma_end =
+            luma.offset_bytes + U(int64_t{luma.height} * luma.row_stride_bytes);
+        if (cb.offset_bytes != luma_end) {
+          return conformance.Fail(
+              "chroma red component should come right after luma component in buffer");
+        }
+      }
+      const bool cb_first = interleaved_chroma_order_ == InterleavedChromaOrder::kCbCr;
+      const int cb_phase = cb_first ? 0 : 1;
+      const int cr_phase = cb_first ? 1 : 0;
+      if (luma.pixel_stride != 1 || luma.pixel_phase != 0 || cb.pixel_stride != 2 ||
+          cb.pixel_phase != cb_phase || cr.pixel_stride != 2 || cr.pixel_phase != cr_phase) {
+        return conformance.Fail("pixel interleaving not as expected");
+      }
+      size_t alignment = 0;
+      if (IsOneOf(target,
+                  {F::YCBCR_420_888_STRIDE_ALIGNED_64, F::YCBCR_420_SP_M_S10B_STRIDE_ALIGNED_64,
+                   F::YCBCR_420_888_SINGLE_BUFFER_STRIDE_ALIGNED_64,
+                   F::YCBCR_P010_M_STRIDE_ALIGNED_64})) {
+        alignment = 64;
+      } else if (target == F::YCBCR_P010_M) {
+        alignment = 32;
+      } else {
+        return OkStatus();
+      }
+      if (luma.row_stride_bytes != cb.row_stride_bytes ||
+          luma.row_stride_bytes != cr.row_stride_bytes) {
+        return conformance.Fail("components have different row strides, y: ", luma.row_stride_bytes,
+                                ", u: ", cb.row_stride_bytes, ", v: ", cr.row_stride_bytes);
+      }
+      if (!IsAlignedTo(luma.row_stride_bytes, alignment)) {
+        return conformance.Fail("row stride is not aligned to ", alignment,
+                                " bytes: ", luma.row_stride_bytes);
+      }
+      return OkStatus();
+    }
+    case RuleSet::kYv12: {
+      ORVEX_CONFORMANCE_CALL(IsYuv(verbose));
+      ORVEX_CONFORMANCE_CALL(ConformsTo(ChromaSubsampling::k420, verbose));
+      ORVEX_CONFORMANCE_GET(luma, CC::kLuma);
+      ORVEX_CONFORMANCE_GET(cb, CC::kChromaB);
+      ORVEX_CONFORMANCE_GET(cr, CC::kChromaR);
+      ORVEX_CONFORMANCE_CALL(CheckDimensionsValid(luma.width, luma.height, 4, 2, verbose));
+      if (luma.row_stride_bytes % 16 != 0 || cb.row_stride_bytes % 16 != 0 ||
+          cr.row_stride_bytes % 16 != 0) {
+        return conformance.Fail("component strides must all be multiples of 16");
+      }
+      if (luma.buffer_index != cb.buffer_index || luma.buffer_index != cr.buffer_index) {
+        return conformance.Fail("All components should be in the same buffer");
+      }
+      if (cr.offset_bytes != luma.offset_bytes + U(int64_t{luma.row_stride_bytes} * luma.height)) {
+        return conformance.Fail(
+            "chroma red component should come right after luma component in buffer");
+      }
+      if (cb.offset_bytes != cr.offset_bytes + U(int64_t{cr.row_stride_bytes} * cr.height)) {
+        return conformance.Fail(
+            "chroma blue component should come right after chroma red component in buffer");
+      }
+      for (const Component& c : components_) {
+        if (c.pixel_stride != 1 || c.pixel_phase != 0) {
+          return conformance.Fail("there should be no pixel interleaving");
+        }
+      }
+      return OkStatus();
+    }
+    case RuleSet::kInterleaved422: {
+      ORVEX_CONFORMANCE_CALL(IsYuv(verbose));
+      ORVEX_CONFORMANCE_CALL(ConformsTo(ChromaSubsampling::k422, verbose));
+      ORVEX_CONFORMANCE_GET(luma, CC::kLuma);
+      ORVEX_CONFORMANCE_GET(cb, CC::kChromaB);
+      ORVEX_CONFORMANCE_GET(cr, CC::kChromaR);
+      ORVEX_CONFORMANCE_CALL(CheckDimensionsValid(luma.width, luma.height, 2, 1, verbose));
+      if (luma.buffer_index != cb.buffer_index || luma.buffer_index != cr.buffer_index) {
+        return conformance.Fail("All components should be in the same buffer");
+      }
+      if (luma.offset_bytes != cb.offset_bytes || luma.offset_bytes != cr.offset_bytes) {
+        return conformance.Fail("All components should have the same offset");
+      }
+      if (luma.pixel_stride != 2 || luma.pixel_phase != 0 || cb.pixel_stride != 4 ||
+          cb.pixel_phase != 1 || cr.pixel_stride != 4 || cr.pixel_phase != 3) {
+        return conformance.Fail("pixel interleaving not as expected");
+      }
+      return OkStatus();
+    }
+    case RuleSet::kSbwcBayerLossless: {
+      ORVEX_CONFORMANCE_GET(header, CC::kCompressedBayerHeader);
+      ORVEX_CONFORMANCE_GET(payload, CC::kCompressedBayerPayload);
+      (void)header;
+      (void)payload;
+      return OkStatus();
+    }
+    case RuleSet::kSbwcBayerLossy: {
+      ORVEX_CONFORMANCE_GET(payload, CC::kCompressedBayerPayload);
+      if (!IsAlignedTo(payload.row_stride_bytes, 32)) {
+        return conformance.Fail("row stride is not aligned to ", 32,
+                                " bytes: ", payload.row_stride_bytes, " for ",
+                                ComponentContentToString(payload.content));
+      }
+      return OkStatus();
+    }
+    case RuleSet::kSbwcYuvLossless:
+    case RuleSet::kSbwcYuvLossy: {
+      const bool lossless = RuleSetOf(target) == RuleSet::kSbwcYuvLossless;
+      const bool stride_aligned_64 =
+          IsOneOf(target, {F::YCBCR_420_SP_M_SBWC_STRIDE_ALIGNED_64,
+                           F::YCBCR_420_SP_M_S10B_SBWC_STRIDE_ALIGNED_64,
+                           F::YCBCR_420_SP_M_SBWC_L50_STRIDE_ALIGNED_64,
+                           F::YCBCR_420_SP_M_S10B_SBWC_L40_STRIDE_ALIGNED_64,
+                           F::YCBCR_420_SP_M_S10B_SBWC_L80_STRIDE_ALIGNED_64});
+      const size_t alignment = stride_aligned_64 ? 64 : (lossless ? 16 : 32);
+      static constexpr std::array<CC, 4> kLosslessContents = {
+          CC::kCompressedLumaHeader, CC::kCompressedLumaPayload, CC::kCompressedChromaHeader,
+          CC::kCompressedChromaPayload};
+      static constexpr std::array<CC, 2> kLossyContents = {CC::kCompressedLumaPayload,
+                                                           CC::kCompressedChromaPayload};
+      const CC* begin = lossless ? kLosslessContents.data() : kLossyContents.data();
+      const CC* end = begin + (lossless ? kLosslessContents.size() : kLossyContents.size());
+      for (const CC* content = begin; content != end; ++content) {
+        ORVEX_CONFORMANCE_GET(c, *content);
+        if (!IsAlignedTo(c.row_stride_bytes, alignment)) {
+          return conformance.Fail("row stride is not aligned to ", alignment,
+                                  " bytes: ", c.row_stride_bytes, " for ",
+                                  ComponentContentToString(c.content));
+        }
+      }
+      return OkStatus();
+    }
+    case RuleSet::kAfbcExtraWideBlock:
+    case RuleSet::kAfbcWideBlock: {
+      namespace afbc = afbc_size_utils::detail;
+      const bool extra_wide = target == F::YCBCR_420_888_AFBC_EXTRAWIDEBLK;
+      const int64_t w = width_;
+      const int64_t luma_header = afbc::HeaderStride(afbc::HeaderWidth(target, w));
+      const std::array<std::pair<CC, int64_t>, 4> expected = {{
+          {CC::kCompressedLumaHeader, luma_header},
+          {CC::kCompressedLumaPayload,
+           afbc::PayloadStride(afbc::PayloadWidth(target, w), extra_wide ? bpp : (3 * bpp) / 2)},
+          {CC::kCompressedChromaHeader,
+           extra_wide ? afbc::HeaderStride(afbc::HeaderWidth(target, w / 2)) : luma_header},
+          {CC::kCompressedChromaPayload,
+           extra_wide ? afbc::PayloadStride(afbc::PayloadWidth(target, w / 2), 2 * int64_t{bpp})
+                      : afbc::PayloadStride(afbc::PayloadWidth(target, w), (3 * bpp) / 2)},
+      }};
+      for (const auto& [content, stride] : expected) {
+        ORVEX_CONFORMANCE_GET(c, content);
+        if (c.row_stride_bytes != stride) {
+          return conformance.Fail("row stride is not conformed to ", subject, " for ",
+                                  ComponentContentToString(content),
+                                  ", value: ", c.row_stride_bytes, ", expected: ", stride);
+        }
+      }
+      return OkStatus();
+    }
+  }
+  return OkStatus();
+}
+
+#undef ORVEX_CONFORMANCE_GET
+#undef ORVEX_CONFORMANCE_CALL
+
+bool ImageFormat::Is64ByteAligned() const { return Is64ByteAlignedPixelFormat(format_); }
+
+}  // namespace orvex
