@@ -17,8 +17,7 @@ TEST(SbwcSizeUtilsTest, LosslessPayloadStride) {
       {4000, 16, 64, 16 * 512},  // 16 started groups of 256 pixels, 512 bytes each
       {4000, 16, 32, 16 * 512}, {256, 8, 32, 256},        // 2048 bits per block
       {257, 8, 64, 512},        {1920, 10, 32, 8 * 320},  // 2560 bits per block
-      {1920, 10, 64, 8 * 384},                            // 320-byte blocks aligned to 384
-      {256, 9, 32, 320},                                  // 2304 bits round up to 2560
+      {1920, 10, 64, 8 * 320},  {256, 9, 32, 320},        // 2304 bits round up to 2560
       {1, 12, 64, 384},         {0, 16, 64, 0},
   };
   for (const Case& c : cases) {

@@ -1,0 +1,164 @@
+#include "orvex/api/thread/fence.h"
+
+#include <chrono>
+#include <cstdint>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <utility>
+#include <variant>
+#include <vector>
+
+#include "absl/time/time.h"
+#include "orvex/api/debug/perf_trace.h"
+#include "orvex/api/thread/fence_internal.h"
+#include "orvex/api/thread/two_stage_software_fence.h"
+#include "orvex/status/log.h"
+#include "orvex/status/status_builder.h"
+
+namespace orvex {
+
+Fence::~Fence() = default;
+
+Status Fence::AddListener(FenceListener /*listener*/) {
+  return UnimplementedError(
+      "Fence::AddListener is unimplemented by design. Specific fence implementations must "
+      "provide their own implementation of AddListener if needed.");
+}
+
+Status Fence::GetStatus() const {
+  FenceWaitResult result = WaitForDone(absl::ZeroDuration());
+  if (Status* status = std::get_if<Status>(&result)) return std::move(*status);
+  return UnavailableErrorBuilder(ORVEX_LOC) << "Fence not yet (fully) signalled.";
+}
+
+std::unique_ptr<Fence> CreateFence(FenceType type) {
+  switch (type) {
+    case FenceType::kDummy:
+      return std::make_unique<DummyFence>();
+    case FenceType::kSoftware:
+      return std::make_unique<SoftwareFence>();
+    case FenceType::kTwoStageSoftware:
+      return std::make_unique<TwoStageSoftwareFence>();
+    case FenceType::kDefault:
+      break;
+  }
+  ORVEX_LOG(FATAL) << "Should not reach here. Allocator must substsitute a proper type for "
+                      "kDefault before calling this function.";
+}
+
+DummyFence::~DummyFence() = default;
+
+FenceWaitResult DummyFence::WaitForDone(absl::Duration /*timeout*/) const { return OkStatus(); }
+
+Status DummyFence::AddListener(FenceListener listener) {
+  fence_internal::CallListener(listener, OkStatus());
+  return OkStatus();
+}
+
+void DummyFence::Abort() {}
+
+SoftwareFence::SoftwareFence() : SoftwareFence("unnamed") {}
+
+SoftwareFence::SoftwareFence(std::string_view name)
+    : status_(UnavailableError("Software fence has not been signaled yet")), name_(name) {
+  listeners_.reserve(8);
+}
+
+SoftwareFence::~SoftwareFence() {
+  std::unique_lock<std::mutex> lock(mutex_);
+  if (signals_in_flight_ == 0) return;
+  if (fence_internal::ListenerScope::IsRunningListenersOf(this)) {
+    ORVEX_LOG(FATAL) << "SoftwareFence \"" << name_
+                     << "\" destroyed by one of its own listeners while being signalled";
+  }
+  cond_.wait(lock, [this] { return signals_in_flight_ == 0; });
+}
+
+void SoftwareFence::Signal(Status status) {
+  std::vector<FenceListener> listeners;
+  {
+    std::lock_guard<std::mutex> lock(mutex_);
+    signaled_ = true;
+    status_ = std::move(status);
+    if (listeners_.empty()) {
+      // Nothing runs outside the lock: wake waiters now. A notification
+      // without waiters makes no system call.
+      cond_.notify_all();
+      return;
+    }
+    listeners.swap(listeners_);
+    status = status_;
+    ++signals_in_flight_;
+  }
+  {
+    fence_internal::ListenerScope scope(this);
+    for (FenceListener& listener : listeners) fence_internal::CallListener(listener, status);
+  }
+  {
+    // Waking under the lock: once a waiter can observe the end of this
+    // signal, this thread no longer touches the fence.
+    std::lock_guard<std::mutex> lock(mutex_);
+    --signals_in_flight_;
+    cond_.notify_all();
+  }
+}
+
+void SoftwareFence::Abort() { Signal(AbortedError("Fence was aborted")); }
+
+Status SoftwareFence::AddListener(FenceListener listener) {
+  std::unique_lock<std::mutex> lock(mutex_);
+  if (signaled_) {
+    Status status = status_;
+    lock.unlock();
+    fence_internal::CallListener(listener, std::move(status));
+    return OkStatus();
+  }
+  listeners_.push_back(std::move(listener));
+  return OkStatus();
+}
+
+FenceWaitResult SoftwareFence::WaitForDone(absl::Duration timeout) const {
+  PerfTrace trace(5, "SoftwareFence WaitForDone");
+  std::unique_lock<std::mutex> lock(mutex_);
+  if (timeout <= absl::ZeroDuration()) {
+    if (signaled_) return status_;
+    return orvex_api::FenceNotDone{};
+  }
+  // A blocked waiter wakes only once every listener of the signal has run.
+  const auto done = [this] { return signaled_ && signals_in_flight_ == 0; };
+  const std::optional<std::chrono::steady_clock::time_point> deadline =
+      fence_internal::DeadlineAfter(timeout, absl::Microseconds(1));
+  if (!deadline.has_value()) {
+    cond_.wait(lock, done);
+    return status_;
+  }
+  while (!done()) {
+    if (std::chrono::steady_clock::now() >= *deadline) {
+      if (signaled_) return status_;
+      return orvex_api::FenceNotDone{};
+    }
+    cond_.wait_until(lock, *deadline);
+  }
+  return status_;
+}
+
+void SoftwareFence::Reset(std::string name) {
+  std::vector<FenceListener> dropped;
+  {
+    std::lock_guard<std::mutex> lock(mutex_);
+    signaled_ = false;
+    status_ = UnavailableError("SoftwareFence has not been signaled yet.");
+    dropped.swap(listeners_);
+    name_ = std::move(name);
+  }
+  // The dropped listeners are destroyed outside the lock: their captures may
+  // own objects whose destruction calls back into this fence.
+}
+
+std::string SoftwareFence::name() const {
+  std::lock_guard<std::mutex> lock(mutex_);
+  return name_;
+}
+
+}  // namespace orvex

@@ -1,0 +1,41 @@
+#include "orvex/api/thread/fence_internal.h"
+
+#include <chrono>
+#include <optional>
+
+#include "absl/time/time.h"
+
+namespace orvex {
+namespace fence_internal {
+namespace {
+
+thread_local ListenerScope* innermost_scope = nullptr;
+
+// Longer timeouts wait without limit; this keeps the deadline arithmetic far
+// from the clock's range.
+constexpr absl::Duration kLongestFiniteWait = absl::Hours(24 * 365 * 100);
+
+}  // namespace
+
+std::optional<std::chrono::steady_clock::time_point> DeadlineAfter(absl::Duration timeout,
+                                                                   absl::Duration unit) {
+  if (timeout >= kLongestFiniteWait) return std::nullopt;
+  const absl::Duration rounded = absl::Ceil(timeout, unit);
+  return std::chrono::steady_clock::now() + absl::ToChronoNanoseconds(rounded);
+}
+
+ListenerScope::ListenerScope(const void* fence) : fence_(fence), outer_(innermost_scope) {
+  innermost_scope = this;
+}
+
+ListenerScope::~ListenerScope() { innermost_scope = outer_; }
+
+bool ListenerScope::IsRunningListenersOf(const void* fence) {
+  for (const ListenerScope* scope = innermost_scope; scope != nullptr; scope = scope->outer_) {
+    if (scope->fence_ == fence) return true;
+  }
+  return false;
+}
+
+}  // namespace fence_internal
+}  // namespace orvex

@@ -1,0 +1,266 @@
+#include "orvex/api/thread/two_stage_software_fence.h"
+
+#include <atomic>
+#include <chrono>
+#include <string>
+#include <thread>
+#include <variant>
+#include <vector>
+
+#include "absl/time/clock.h"
+#include "absl/time/time.h"
+#include "gmock/gmock.h"
+#include "gtest/gtest.h"
+#include "orvex/status/status_matchers.h"
+
+namespace orvex {
+namespace {
+
+using ::orvex::testing::StatusIs;
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+
+const Status kE1 = DataLossError("e1");
+const Status kE2 = CancelledError("e2");
+constexpr char kReadyAgainOk[] =
+    "Two stage fence signaled ready-to-start is already signaled with OkStatus, it cannot be "
+    "signaled again with OkStatus.";
+
+enum class State { kInitial, kReady, kDoneOk, kFailed, kDoneAfterOkStart };
+enum class Op { kReadyOk, kReadyE2, kDoneOk, kDoneE2, kAbort };
+
+void Enter(TwoStageSoftwareFence& fence, State state) {
+  switch (state) {
+    case State::kInitial:
+      break;
+    case State::kReady:
+      ASSERT_TRUE(fence.SignalReadyToStart(OkStatus()).ok());
+      break;
+    case State::kDoneOk:
+      ASSERT_TRUE(fence.SignalReadyToStart(OkStatus()).ok());
+      ASSERT_TRUE(fence.SignalDone(OkStatus()).ok());
+      break;
+    case State::kFailed:
+      ASSERT_TRUE(fence.SignalReadyToStart(kE1).ok());
+      break;
+    case State::kDoneAfterOkStart:
+      ASSERT_TRUE(fence.SignalReadyToStart(OkStatus()).ok());
+      ASSERT_TRUE(fence.SignalDone(kE1).ok());
+      break;
+  }
+}
+
+Status Apply(TwoStageSoftwareFence& fence, Op op) {
+  switch (op) {
+    case Op::kReadyOk:
+      return fence.SignalReadyToStart(OkStatus());
+    case Op::kReadyE2:
+      return fence.SignalReadyToStart(kE2);
+    case Op::kDoneOk:
+      return fence.SignalDone(OkStatus());
+    case Op::kDoneE2:
+      return fence.SignalDone(kE2);
+    case Op::kAbort:
+      fence.Abort();
+      return OkStatus();
+  }
+  return InternalError("unknown op");
+}
+
+// "OK"/status text, or "-" for a stage not yet over.
+std::string ReadyText(const TwoStageSoftwareFence& fence) {
+  Status s = fence.GetReadyToStartStatus();
+  return IsUnavailable(s) ? "-" : s.ToString();
+}
+std::string DoneText(const TwoStageSoftwareFence& fence) {
+  FenceWaitResult r = fence.WaitForDone(absl::ZeroDuration());
+  return std::holds_alternative<Status>(r) ? std::get<Status>(r).ToString() : "-";
+}
+
+TEST(TwoStageSoftwareFenceTest, EveryTransition) {
+  const std::string ok = "OK", e1 = kE1.ToString(), e2 = kE2.ToString();
+  const std::string aborted = "ABORTED: Fence was aborted";
+  const std::string done_twice =
+      "FAILED_PRECONDITION: Two stage fence signaled done twice, and one of the statuses was not "
+      "an error: Old status = ";
+  struct Case {
+    State state;
+    Op op;
+    std::string result, ready, done;
+  };
+  const Case cases[] = {
+      {State::kInitial, Op::kReadyOk, ok, ok, "-"},
+      {State::kInitial, Op::kReadyE2, ok, e2, e2},
+      {State::kInitial, Op::kDoneOk,
+       "FAILED_PRECONDITION: Two stage fence done signaled ok, but ready-to-start signal was "
+       "never received",
+       "-", "-"},
+      {State::kInitial, Op::kDoneE2, ok, e2, e2},
+      {State::kInitial, Op::kAbort, ok, aborted, aborted},
+      {State::kReady, Op::kReadyOk, "FAILED_PRECONDITION: " + std::string(kReadyAgainOk), ok, "-"},
+      {State::kReady, Op::kReadyE2, ok, e2, e2},
+      {State::kReady, Op::kDoneOk, ok, ok, ok},
+      {State::kReady, Op::kDoneE2, ok, ok, e2},
+      {State::kReady, Op::kAbort, ok, aborted, aborted},
+      {State::kDoneOk, Op::kReadyOk, "FAILED_PRECONDITION: " + std::string(kReadyAgainOk), ok, ok},
+      {State::kDoneOk, Op::kReadyE2, ok, e2, ok},
+      {State::kDoneOk, Op::kDoneOk, done_twice + "OK New status = OK", ok, ok},
+      {State::kDoneOk, Op::kDoneE2, done_twice + "OK New status = " + e2, ok, ok},
+      {State::kDoneOk, Op::kAbort, ok, aborted, aborted},
+      {State::kFailed, Op::kReadyOk,
+       "FAILED_PRECONDITION: Two stage fence signaled ready-to-start is already signaled with " +
+           e1 + " Cannot change to OkStatus since error already happened.",
+       e1, e1},
+      {State::kFailed, Op::kReadyE2, ok, e1, e1},
+      {State::kFailed, Op::kDoneOk, done_twice + e1 + " New status = OK", e1, e1},
+      {State::kFailed, Op::kDoneE2, ok, e1, e2},
+      {State::kFailed, Op::kAbort, ok, aborted, aborted},
+      {State::kDoneAfterOkStart, Op::kReadyOk, "FAILED_PRECONDITION: " + std::string(kReadyAgainOk),
+       ok, e1},
+      {State::kDoneAfterOkStart, Op::kReadyE2, ok, e2, e1},
+      {State::kDoneAfterOkStart, Op::kDoneOk, done_twice + e1 + " New status = OK", ok, e1},
+      {State::kDoneAfterOkStart, Op::kDoneE2, ok, ok, e2},
+      {State::kDoneAfterOkStart, Op::kAbort, ok, aborted, aborted},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(::testing::Message()
+                 << "state " << static_cast<int>(c.state) << " op " << static_cast<int>(c.op));
+    TwoStageSoftwareFence fence;
+    Enter(fence, c.state);
+    EXPECT_EQ(Apply(fence, c.op).ToString(), c.result);
+    EXPECT_EQ(ReadyText(fence), c.ready);
+    EXPECT_EQ(DoneText(fence), c.done);
+  }
+}
+
+TEST(TwoStageSoftwareFenceTest, ListenersRunOnlyInSignalDone) {
+  TwoStageSoftwareFence fence;
+  std::vector<std::string> calls;
+  ASSERT_TRUE(fence.AddListener([&](Status s) { calls.push_back("a " + s.ToString()); }).ok());
+  ASSERT_TRUE(fence.AddListener([&](Status s) { calls.push_back("b " + s.ToString()); }).ok());
+  ASSERT_TRUE(fence.SignalReadyToStart(kE1).ok());
+  fence.Abort();
+  EXPECT_TRUE(calls.empty());  // failed without SignalDone: nobody called
+  ASSERT_TRUE(fence.AddListener([&](Status s) { calls.push_back("c " + s.ToString()); }).ok());
+  ASSERT_TRUE(fence.SignalDone(kE2).ok());
+  ASSERT_TRUE(fence.AddListener([&](Status s) { calls.push_back("d " + s.ToString()); }).ok());
+  EXPECT_THAT(calls, ElementsAre("c ABORTED: Fence was aborted", "a " + kE2.ToString(),
+                                 "b " + kE2.ToString(), "d " + kE2.ToString()));
+}
+
+TEST(TwoStageSoftwareFenceTest, WaitsTimeOutAndWake) {
+  TwoStageSoftwareFence fence;
+  EXPECT_THAT(fence.GetReadyToStartStatus(),
+              StatusIs(StatusCode::kUnavailable,
+                       "Two stage fence has not been signaled ready-to-start yet"));
+  EXPECT_THAT(fence.WaitUntilReadyToStart(absl::Milliseconds(2)),
+              StatusIs(StatusCode::kDeadlineExceeded,
+                       "timed out waiting for two stage software fence ready-to-start signal "
+                       "with a timeout duration of: 2ms"));
+  EXPECT_THAT(fence.WaitUntilReadyToStart(absl::ZeroDuration()),
+              StatusIs(StatusCode::kDeadlineExceeded));
+  EXPECT_TRUE(
+      std::holds_alternative<orvex_api::FenceNotDone>(fence.WaitForDone(absl::Microseconds(100))));
+  std::thread producer([&] {
+    std::this_thread::sleep_for(std::chrono::milliseconds(5));
+    EXPECT_TRUE(fence.SignalReadyToStart(OkStatus()).ok());
+    std::this_thread::sleep_for(std::chrono::milliseconds(5));
+    EXPECT_TRUE(fence.SignalDone(kE1).ok());
+  });
+  EXPECT_TRUE(fence.WaitUntilReadyToStart(absl::InfiniteDuration()).ok());
+  EXPECT_EQ(std::get<Status>(fence.WaitForDone(absl::Seconds(30))), kE1);
+  producer.join();
+}
+
+TEST(TwoStageSoftwareFenceTest, ForfeitCarriesTheConsumerError) {
+  TwoStageSoftwareFence fence;
+  const Status forfeit = DeadlineExceededError("consumer gave up");
+  EXPECT_THAT(fence.WaitUntilReadyToStartOrForfeit(absl::Milliseconds(1), forfeit),
+              StatusIs(StatusCode::kDeadlineExceeded,
+                       HasSubstr("ready-to-start signal with a timeout duration of: 1ms")));
+  EXPECT_EQ(std::get<Status>(fence.WaitForDone(absl::ZeroDuration())), forfeit);
+  EXPECT_EQ(fence.GetReadyToStartStatus(), forfeit);
+  EXPECT_THAT(fence.SignalDone(OkStatus()),
+              StatusIs(StatusCode::kFailedPrecondition, HasSubstr("signaled done twice")));
+  // A second consumer finds the first one's timeout.
+  EXPECT_THAT(
+      fence.WaitUntilReadyToStartOrForfeit(absl::Milliseconds(1), kE2),
+      StatusIs(StatusCode::kInternal,
+               "Ready-to-start fence is with timeout status (DEADLINE_EXCEEDED: consumer "
+               "gave up), meaning that the consumer already timeout and gave up the frame"));
+
+  TwoStageSoftwareFence ready;
+  ASSERT_TRUE(ready.SignalReadyToStart(OkStatus()).ok());
+  EXPECT_TRUE(ready.WaitUntilReadyToStartOrForfeit(absl::ZeroDuration(), kE1).ok());
+  EXPECT_TRUE(
+      std::holds_alternative<orvex_api::FenceNotDone>(ready.WaitForDone(absl::ZeroDuration())));
+}
+
+TEST(TwoStageSoftwareFenceDeathTest, ForfeitWithOkIsFatal) {
+  TwoStageSoftwareFence fence;
+  EXPECT_DEATH((void)fence.WaitUntilReadyToStartOrForfeit(absl::Milliseconds(1), OkStatus()),
+               "Check failed: forfeit_status != OkStatus\\(\\) \\(forfeit_status=OK, "
+               "OkStatus\\(\\)=OK\\) Cannot forfeit with Ok status, even to confuse the enemy\\.");
+}
+
+// A producer racing a consumer that forfeits: exactly one of them wins the
+// ready-to-start stage, and every listener runs exactly once.
+TEST(TwoStageSoftwareFenceStressTest, ForfeitRacesLateProducer) {
+  const absl::Time end = absl::Now() + absl::Seconds(2);
+  int rounds = 0, forfeits = 0;
+  for (; rounds < 3000 && absl::Now() < end; ++rounds) {
+    TwoStageSoftwareFence fence;
+    std::atomic<int> calls{0};
+    std::vector<Status> seen(4);
+    for (int i = 0; i < 2; ++i) {
+      ASSERT_TRUE(fence
+                      .AddListener([&, i](Status s) {
+                        seen[i] = s;
+                        calls.fetch_add(1);
+                      })
+                      .ok());
+    }
+    Status consumer_result, producer_ready;
+    std::thread consumer([&] {
+      consumer_result = fence.WaitUntilReadyToStartOrForfeit(absl::Microseconds(rounds % 200), kE1);
+    });
+    std::thread listener_adder([&] {
+      for (int i = 2; i < 4; ++i) {
+        EXPECT_TRUE(fence
+                        .AddListener([&, i](Status s) {
+                          seen[i] = s;
+                          calls.fetch_add(1);
+                        })
+                        .ok());
+      }
+    });
+    std::thread waiter([&] { (void)fence.WaitForDone(absl::InfiniteDuration()); });
+    std::thread producer([&] {
+      producer_ready = fence.SignalReadyToStart(OkStatus());
+      // A refused producer still completes the frame, with its own error.
+      EXPECT_TRUE(fence.SignalDone(producer_ready.ok() ? OkStatus() : kE2).ok());
+    });
+    for (std::thread* t : {&consumer, &listener_adder, &waiter, &producer}) t->join();
+    const Status done = std::get<Status>(fence.WaitForDone(absl::ZeroDuration()));
+    if (consumer_result.ok()) {
+      EXPECT_TRUE(producer_ready.ok());
+      EXPECT_TRUE(done.ok());
+    } else {
+      ++forfeits;
+      EXPECT_THAT(consumer_result, StatusIs(StatusCode::kDeadlineExceeded));
+      EXPECT_THAT(producer_ready, StatusIs(StatusCode::kFailedPrecondition));
+      EXPECT_EQ(done, kE2);
+    }
+    ASSERT_EQ(calls.load(), 4);
+    // Listeners present at SignalDone see its status; one added after a
+    // forfeit runs at once with the forfeit status.
+    EXPECT_EQ(seen[0], done);
+    EXPECT_EQ(seen[1], done);
+    for (int i = 2; i < 4; ++i) EXPECT_TRUE(seen[i] == done || seen[i] == kE1) << seen[i];
+  }
+  EXPECT_GT(rounds, 0);
+  RecordProperty("forfeits", forfeits);
+}
+
+}  // namespace
+}  // namespace orvex
