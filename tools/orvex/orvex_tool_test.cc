@@ -11,7 +11,9 @@
 #include <vector>
 
 #include "gmock/gmock.h"
+#include "google/protobuf/util/json_util.h"
 #include "gtest/gtest.h"
+#include "orvex/api/debug/camera_performance_analyzer.pb.h"
 #include "orvex/api/memory/hal_pixel_format.h"
 #include "orvex/status/status_matchers.h"
 #include "tools/orvex/args.h"
@@ -243,7 +245,8 @@ TEST(ToolTest, TopLevelUsageAndUnknownCommand) {
 }
 
 TEST(ToolTest, EveryCommandHasHelp) {
-  for (const Command* command : {&FormatsCommand(), &LayoutCommand()}) {
+  for (const Command* command :
+       {&FormatsCommand(), &LayoutCommand(), &PyramidCommand(), &CpaCommand()}) {
     const std::string name(command->spec.name);
     SCOPED_TRACE(name);
     RunResult result = RunOrvex({name, "--help"});
@@ -470,6 +473,184 @@ TEST(LayoutTest, SvgDrawsEveryBufferAndComponent) {
   EXPECT_EQ(unwritable.code, kExitError);
   EXPECT_EQ(unwritable.err, "INTERNAL: cannot write " + dir.path() + "/no/x.svg\n");
   EXPECT_EQ(XmlEscape("a<b>&\"c"), "a&lt;b&gt;&amp;&quot;c");
+}
+
+}  // namespace
+}  // namespace orvex_tool
+
+namespace orvex_tool {
+namespace {
+
+TEST(PyramidTest, TextAndJson) {
+  const std::vector<std::string> args = {"pyramid",     "4000", "3000",  "--levels", "0:2",
+                                         "--alignment", "64",   "--bpp", "10"};
+  RunResult text = RunOrvex(args);
+  ASSERT_EQ(text.code, kExitOk) << text.err;
+  EXPECT_EQ(text.out,
+            "LEVEL  WIDTH  HEIGHT     BYTES\n"
+            "    0   4000    3000  15168000\n"
+            "    1   2000    1500   3840000\n"
+            "    2   1000     750    960000\n"
+            "total: 19968000 bytes\n");
+
+  std::vector<std::string> json_args = {"pyramid", "100",   "75", "--levels=1:2", "--alignment",
+                                        "64",      "--bpp", "8",  "--json"};
+  RunResult json = RunOrvex(json_args);
+  ASSERT_EQ(json.code, kExitOk) << json.err;
+  EXPECT_EQ(json.out,
+            "{\n"
+            "  \"levels\": [\n"
+            "    {\"level\": 1, \"width\": 50, \"height\": 38, \"bytes\": 2432},\n"
+            "    {\"level\": 2, \"width\": 25, \"height\": 19, \"bytes\": 1216}\n"
+            "  ],\n"
+            "  \"total_bytes\": 3648\n"
+            "}\n");
+}
+
+TEST(PyramidTest, Errors) {
+  struct Case {
+    std::vector<std::string> args;
+    std::string err;
+  };
+  const std::string hint = "\nRun 'orvex pyramid --help' for usage.\n";
+  const Case cases[] = {
+      {{"pyramid", "64", "64", "--alignment", "64", "--bpp", "8"},
+       "orvex pyramid: --levels, --alignment and --bpp are required" + hint},
+      {{"pyramid", "64", "64", "--levels", "2:1", "--alignment", "64", "--bpp", "8"},
+       "orvex pyramid: --levels LOW must not exceed HIGH, got 2:1" + hint},
+      {{"pyramid", "64", "64", "--levels", "0:32", "--alignment", "64", "--bpp", "8"},
+       "orvex pyramid: HIGH must be between 0 and 31, got 32" + hint},
+      {{"pyramid", "64", "64", "--levels", "0:1", "--alignment", "x", "--bpp", "8"},
+       "orvex pyramid: --alignment must be a whole number, got 'x'" + hint},
+      {{"pyramid", "0", "64", "--levels", "0:1", "--alignment", "1", "--bpp", "8"},
+       "orvex pyramid: WIDTH must be between 1 and 2147483647, got 0" + hint},
+      {{"pyramid", "64", "64", "--levels", "0:1", "--alignment", "0", "--bpp", "8"},
+       "INVALID_ARGUMENT: alignment must be >= 1, received: 0\n"},
+      {{"pyramid", "64", "64", "--levels", "0:1", "--alignment", "1", "--bpp", "-8"},
+       "INVALID_ARGUMENT: bits per pixel must be >= 0, received: -8\n"},
+      // Sizes beyond 32 bits are refused, never wrapped.
+      {{"pyramid", "65536", "65536", "--levels", "1:2", "--alignment", "64", "--bpp", "13"},
+       "INVALID_ARGUMENT: total buffer size of levels [1, 2] for a 65536x65536 image does not "
+       "fit in 32 bits\n"},
+      {{"pyramid", "2147483647", "2", "--levels", "0:0", "--alignment", "2147483647", "--bpp",
+        "16"},
+       "INVALID_ARGUMENT: buffer size of level 0 for a 2147483647x2 image does not fit in 32 "
+       "bits\n"},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(::testing::PrintToString(c.args));
+    RunResult result = RunOrvex(c.args);
+    EXPECT_EQ(result.code, kExitError);
+    EXPECT_EQ(result.out, "");
+    EXPECT_EQ(result.err, c.err);
+  }
+}
+
+void WriteFile(const std::string& path, const std::string& bytes) {
+  std::ofstream out(path, std::ios::binary | std::ios::trunc);
+  out << bytes;
+}
+
+orvex::CameraPerformanceDataFile SampleCpa() {
+  orvex::CameraPerformanceDataFile file;
+  orvex::CameraLatencyData* open = file.add_camera_latency_data();
+  open->set_operation_case("Camera-Open");
+  orvex::CameraLatencyDataType* overall = open->add_latency_data();
+  overall->set_event_name("Overall");
+  overall->set_duration_ms(212.5f);
+  orvex::CameraLatencyDataType* sensor = open->add_latency_data();
+  sensor->set_event_name("SensorPowerUp");
+  sensor->set_duration_ms(48.0625f);
+  file.add_camera_latency_data()->set_operation_case("Camera-Close");
+  orvex::CameraPerformanceData* camera = file.add_camera_data();
+  camera->set_camera_id(1);
+  camera->add_per_frame_data()->set_frame_number(7);
+  camera->add_per_frame_data()->set_frame_number(8);
+  file.mutable_graph_representation()->set_graph_name("preview");
+  file.mutable_graph_representation()->add_nodes()->set_node_name("isp");
+  return file;
+}
+
+TEST(CpaTest, SummaryOfAFullFile) {
+  ScratchDir dir;
+  const std::string path = dir.path() + "/sample.cpa";
+  WriteFile(path, SampleCpa().SerializeAsString());
+  RunResult result = RunOrvex({"cpa", path});
+  ASSERT_EQ(result.code, kExitOk) << result.err;
+  EXPECT_EQ(result.out,
+            "OPERATION     EVENT          DURATION (ms)\n"
+            "Camera-Open   Overall              212.500\n"
+            "Camera-Open   SensorPowerUp         48.062\n"
+            "Camera-Close  -                          -\n"
+            "latency data: 2 operations, 2 events\n"
+            "camera data: 1 camera, 2 frames\n"
+            "graph representation: 'preview', 1 nodes, 0 edges\n");
+}
+
+TEST(CpaTest, EmptyFileIsValid) {
+  ScratchDir dir;
+  const std::string path = dir.path() + "/empty.cpa";
+  WriteFile(path, "");
+  RunResult result = RunOrvex({"cpa", path});
+  EXPECT_EQ(result.code, kExitOk);
+  EXPECT_EQ(result.out,
+            "latency data: none\ncamera data: 0 cameras, 0 frames\ngraph representation: none\n");
+  RunResult json = RunOrvex({"cpa", path, "--json"});
+  EXPECT_EQ(json.code, kExitOk);
+  EXPECT_EQ(json.out, "{}\n");
+}
+
+TEST(CpaTest, JsonIsTheProtocolBuffersPrinting) {
+  ScratchDir dir;
+  const std::string path = dir.path() + "/sample.cpa";
+  WriteFile(path, SampleCpa().SerializeAsString());
+  RunResult result = RunOrvex({"cpa", "--json", path});
+  ASSERT_EQ(result.code, kExitOk) << result.err;
+  // The printing parses back to the same message.
+  orvex::CameraPerformanceDataFile parsed;
+  ASSERT_TRUE(google::protobuf::util::JsonStringToMessage(result.out, &parsed).ok());
+  EXPECT_EQ(parsed.SerializeAsString(), SampleCpa().SerializeAsString());
+  EXPECT_THAT(result.out, AllOf(HasSubstr("\"operationCase\": \"Camera-Open\""),
+                                HasSubstr("\"durationMs\": 212.5"), testing::EndsWith("}\n")));
+}
+
+TEST(CpaTest, UnreadableAndCorruptFilesAreErrors) {
+  ScratchDir dir;
+  const std::string missing = dir.path() + "/missing.cpa";
+  RunResult absent = RunOrvex({"cpa", missing});
+  EXPECT_EQ(absent.code, kExitError);
+  EXPECT_EQ(absent.err, "NOT_FOUND: cannot open " + missing + ": No such file or directory\n");
+
+  RunResult directory = RunOrvex({"cpa", dir.path()});
+  EXPECT_EQ(directory.code, kExitError);
+  EXPECT_EQ(directory.err, "FAILED_PRECONDITION: cannot read " + dir.path() + ": Is a directory\n");
+
+  struct Case {
+    std::string name;
+    std::string bytes;
+  };
+  std::string truncated = SampleCpa().SerializeAsString();
+  truncated.resize(truncated.size() - 3);
+  const Case cases[] = {
+      {"truncated", truncated},
+      {"bad wire type", std::string("\x0f", 1)},
+      {"unterminated varint", std::string("\x08\xff\xff", 3)},
+      {"text", "this is not a profile\n"},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.name);
+    const std::string path = dir.path() + "/corrupt.cpa";
+    WriteFile(path, c.bytes);
+    for (bool json : {false, true}) {
+      RunResult result = json ? RunOrvex({"cpa", path, "--json"}) : RunOrvex({"cpa", path});
+      EXPECT_EQ(result.code, kExitError);
+      EXPECT_EQ(result.out, "");
+      EXPECT_EQ(result.err, "INVALID_ARGUMENT: " + path +
+                                " is not a valid .cpa file: it does not parse as a "
+                                "CameraPerformanceDataFile message (" +
+                                std::to_string(c.bytes.size()) + " bytes)\n");
+    }
+  }
 }
 
 }  // namespace
