@@ -11,8 +11,8 @@
 
 namespace orvex {
 
-Buffer::MappedHandle::MappedHandle(int32_t offset, void* data, uint64_t size,
-                                   BufferAccessMode mode, std::shared_ptr<Buffer> buffer)
+Buffer::MappedHandle::MappedHandle(int32_t offset, void* data, uint64_t size, BufferAccessMode mode,
+                                   std::shared_ptr<Buffer> buffer)
     : offset_(offset), data_(data), size_(size), mode_(mode), buffer_(std::move(buffer)) {}
 
 Buffer::MappedHandle::~MappedHandle() {
@@ -126,9 +126,8 @@ StatusOr<std::shared_ptr<HeapBuffer<T>>> HeapBuffer<T>::Make(uint64_t count,
     buffer = nullptr;
   }
   if (buffer == nullptr || buffer->array_ == nullptr) {
-    return ResourceExhaustedErrorBuilder(ORVEX_LOC)
-           << "Cannot allocate a HeapBuffer of " << count << " elements of " << sizeof(T)
-           << " bytes";
+    return ResourceExhaustedErrorBuilder(ORVEX_LOC) << "Cannot allocate a HeapBuffer of " << count
+                                                    << " elements of " << sizeof(T) << " bytes";
   }
   return buffer;
 }

@@ -189,8 +189,8 @@ TEST(BufferTest, BufferIsUsableAsAFence) {
   SoftwareFence* fence = software.get();
   (*buffer)->SetFence(std::move(software));
   const Fence& as_fence = **buffer;
-  EXPECT_TRUE(std::holds_alternative<orvex_api::FenceNotDone>(
-      as_fence.WaitForDone(absl::ZeroDuration())));
+  EXPECT_TRUE(
+      std::holds_alternative<orvex_api::FenceNotDone>(as_fence.WaitForDone(absl::ZeroDuration())));
   fence->Signal(DataLossError("torn"));
   EXPECT_THAT(as_fence.GetStatus(), StatusIs(StatusCode::kDataLoss, "torn"));
   (*buffer)->Abort();
@@ -268,8 +268,8 @@ TEST(BufferConcurrencyTest, CleanupsAndHandlesFromManyThreads) {
   constexpr int kPerThread = 200;
   std::atomic<int> ran{0};
   {
-    auto buffer = HeapBuffer<uint8_t>::Make(kThreads * kPerThread, BufferCompression::kNone,
-                                            nullptr);
+    auto buffer =
+        HeapBuffer<uint8_t>::Make(kThreads * kPerThread, BufferCompression::kNone, nullptr);
     ASSERT_THAT(buffer, IsOk());
     std::vector<std::unique_ptr<Buffer::MappedHandle>> handles(kThreads);
     std::vector<std::thread> threads;

@@ -74,8 +74,8 @@ StatusOr<std::unique_ptr<Buffer::MappedHandle>> SpanBuffer::Map(int64_t offset, 
   return MapImpl(offset, size, mode);
 }
 
-StatusOr<std::unique_ptr<const Buffer::MappedHandle>> SpanBuffer::Map(
-    int64_t offset, uint64_t size, BufferAccessMode mode) const {
+StatusOr<std::unique_ptr<const Buffer::MappedHandle>> SpanBuffer::Map(int64_t offset, uint64_t size,
+                                                                      BufferAccessMode mode) const {
   return MapImpl(offset, size, mode);
 }
 

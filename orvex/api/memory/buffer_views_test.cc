@@ -112,9 +112,9 @@ TEST(SpanBufferTest, SourceFailuresCarryTheViewText) {
   auto proxy = ProxyBuffer::Make(*span, false, nullptr, nullptr);
   ASSERT_THAT(proxy, IsOk());
   EXPECT_THAT((*proxy)->Map(0, 8, BufferAccessMode::kRead),
-              StatusIs(StatusCode::kUnimplemented,
-                       source_error + "; Error mapping: " + (*span)->DebugStr() +
-                           "; Error mapping: " + (*proxy)->DebugStr()));
+              StatusIs(StatusCode::kUnimplemented, source_error +
+                                                       "; Error mapping: " + (*span)->DebugStr() +
+                                                       "; Error mapping: " + (*proxy)->DebugStr()));
 }
 
 TEST(SpanBufferTest, NestedSpansAddTheirOffsets) {
@@ -192,7 +192,8 @@ TEST(ProxyBufferTest, ForwardsToTheSource) {
   EXPECT_EQ((*proxy)->GetAttributes(), kSourceAttributes);
   EXPECT_EQ((*proxy)->GetFd(), 9);
   EXPECT_EQ((*proxy)->GetOffset(), 64);
-  EXPECT_EQ((*proxy)->DebugStr(), "{type: ProxyBuffer, OriginalBuffer: " + source->DebugStr() + "}");
+  EXPECT_EQ((*proxy)->DebugStr(),
+            "{type: ProxyBuffer, OriginalBuffer: " + source->DebugStr() + "}");
 
   auto handle = (*proxy)->Map(4, 8, BufferAccessMode::kWrite);
   ASSERT_THAT(handle, IsOk());
@@ -239,8 +240,8 @@ TEST(ProxyBufferTest, CleanupRouting) {
   };
   for (const Case& c : std::vector<Case>{
            {false, false, true}, {false, true, false}, {true, false, false}, {true, true, false}}) {
-    SCOPED_TRACE(::testing::Message() << "forward_all=" << c.forward_all
-                                      << " propagate=" << c.propagate);
+    SCOPED_TRACE(::testing::Message()
+                 << "forward_all=" << c.forward_all << " propagate=" << c.propagate);
     std::vector<const Buffer*> calls;
     auto source = MakeSource(8);
     auto proxy = ProxyBuffer::Make(source, c.forward_all, nullptr, nullptr);

@@ -238,8 +238,8 @@ StatusOr<std::unique_ptr<Buffer::MappedHandle>> CachePartition::Map(int64_t, uin
   return NotMappable("CachePartition are not mappable: ", *this);
 }
 
-StatusOr<std::unique_ptr<const Buffer::MappedHandle>> CachePartition::Map(
-    int64_t, uint64_t, BufferAccessMode) const {
+StatusOr<std::unique_ptr<const Buffer::MappedHandle>> CachePartition::Map(int64_t, uint64_t,
+                                                                          BufferAccessMode) const {
   return NotMappable("CachePartition are not mappable: ", *this);
 }
 
@@ -302,8 +302,8 @@ StatusOr<std::unique_ptr<Buffer::MappedHandle>> VirtualBuffer::Map(int64_t, uint
   return NotMappable("VirtualBuffers are not mappable: ", *this);
 }
 
-StatusOr<std::unique_ptr<const Buffer::MappedHandle>> VirtualBuffer::Map(
-    int64_t, uint64_t, BufferAccessMode) const {
+StatusOr<std::unique_ptr<const Buffer::MappedHandle>> VirtualBuffer::Map(int64_t, uint64_t,
+                                                                         BufferAccessMode) const {
   return NotMappable("VirtualBuffers are not mappable: ", *this);
 }
 

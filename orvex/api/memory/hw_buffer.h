@@ -80,8 +80,7 @@ class ORVEX_EXPORT HwBuffer final : public Buffer {
                                                   BufferAttributes attributes,
                                                   std::unique_ptr<Fence> fence);
 
-  HwBuffer(Sigil, int fd, uint64_t size, BufferAttributes attributes,
-           std::unique_ptr<Fence> fence);
+  HwBuffer(Sigil, int fd, uint64_t size, BufferAttributes attributes, std::unique_ptr<Fence> fence);
   // Runs the clean-ups, which remove the mappings (most recent first).
   ~HwBuffer() override;
 
@@ -129,11 +128,10 @@ class ORVEX_EXPORT HwBuffer final : public Buffer {
 class ORVEX_EXPORT CachePartition final : public Buffer {
  public:
   static StatusOr<std::shared_ptr<CachePartition>> Make(int fd, uint32_t partition_id,
-                                                        uint64_t size,
-                                                        BufferAttributes attributes,
+                                                        uint64_t size, BufferAttributes attributes,
                                                         std::unique_ptr<Fence> fence);
-  CachePartition(Sigil, int fd, uint32_t partition_id, uint64_t size,
-                 BufferAttributes attributes, std::unique_ptr<Fence> fence);
+  CachePartition(Sigil, int fd, uint32_t partition_id, uint64_t size, BufferAttributes attributes,
+                 std::unique_ptr<Fence> fence);
   ~CachePartition() override;
 
   int GetFd() const override;

@@ -179,18 +179,11 @@ std::string DimensionMessage(Family family, HalPixelFormat format, int bpp) {
   return "";
 }
 
-// Appends the multiple-of text of one dimension; returns whether it failed.
-bool CheckMultiple(std::string_view name, int value, int multiple, bool verbose,
-                   StatusBuilder& builder) {
-  // A zero multiple counts as quotient 0, so the whole value is the rest.
+// `value` - (value / multiple) * multiple with truncating division; a zero
+// multiple counts as quotient 0.
+int64_t Remainder(int value, int multiple) {
   const int64_t quotient = multiple == 0 ? 0 : int64_t{value} / multiple;
-  const int64_t remainder = int64_t{value} - quotient * multiple;
-  if (remainder == 0) return false;
-  if (verbose) {
-    builder << "image " << name << " should be a multiple of " << multiple << ", " << value << " % "
-            << multiple << " = " << remainder;
-  }
-  return true;
+  return int64_t{value} - quotient * multiple;
 }
 
 // OK when width and height are multiples of the given numbers; otherwise
@@ -198,10 +191,18 @@ bool CheckMultiple(std::string_view name, int value, int multiple, bool verbose,
 // two texts).
 Status CheckDimensionsValid(int width, int height, int width_multiple, int height_multiple,
                             bool verbose) {
+  const int64_t width_remainder = Remainder(width, width_multiple);
+  const int64_t height_remainder = Remainder(height, height_multiple);
+  if (width_remainder == 0 && height_remainder == 0) return OkStatus();
   StatusBuilder builder = InvalidArgumentErrorBuilder(ORVEX_LOC);
-  const bool width_failed = CheckMultiple("width", width, width_multiple, verbose, builder);
-  const bool height_failed = CheckMultiple("height", height, height_multiple, verbose, builder);
-  if (!width_failed && !height_failed) return OkStatus();
+  if (verbose && width_remainder != 0) {
+    builder << "image width should be a multiple of " << width_multiple << ", " << width << " % "
+            << width_multiple << " = " << width_remainder;
+  }
+  if (verbose && height_remainder != 0) {
+    builder << "image height should be a multiple of " << height_multiple << ", " << height << " % "
+            << height_multiple << " = " << height_remainder;
+  }
   return builder;
 }
 
@@ -699,13 +700,23 @@ class Conformance {
 
 bool IsAlignedTo(int64_t value, size_t alignment) { return AlignUp(value, alignment) == value; }
 
+const ImageFormat::Component* FindComponent(const std::vector<ImageFormat::Component>& components,
+                                            ImageFormat::ComponentContent content) {
+  for (const ImageFormat::Component& c : components) {
+    if (c.content == content) return &c;
+  }
+  return nullptr;
+}
+
 }  // namespace
 
 // Fetches a component for a conformance rule or returns the wrapped failure.
-#define ORVEX_CONFORMANCE_GET(var, content)                       \
-  const auto var##_or = GetComponentFor((content), verbose);      \
-  if (!var##_or.ok()) return conformance.Wrap(var##_or.status()); \
-  const Component& var = *var##_or
+#define ORVEX_CONFORMANCE_GET(var, content)                                \
+  const Component* var##_ptr = FindComponent(components_, (content));      \
+  if (var##_ptr == nullptr) {                                              \
+    return conformance.Wrap(GetComponentFor((content), verbose).status()); \
+  }                                                                        \
+  const Component& var = *var##_ptr
 
 // Returns the wrapped failure of a called check.
 #define ORVEX_CONFORMANCE_CALL(expr)                \
@@ -718,15 +729,13 @@ bool IsAlignedTo(int64_t value, size_t alignment) { return AlignUp(value, alignm
 
 std::optional<ImageFormat::Component> ImageFormat::GetComponentForInternal(
     ComponentContent content) const {
-  for (const Component& c : components_) {
-    if (c.content == content) return c;
-  }
+  if (const Component* c = FindComponent(components_, content)) return *c;
   return std::nullopt;
 }
 
 StatusOr<ImageFormat::Component> ImageFormat::GetComponentFor(ComponentContent content,
                                                               bool verbose) const {
-  if (std::optional<Component> c = GetComponentForInternal(content)) return *c;
+  if (const Component* c = FindComponent(components_, content)) return *c;
   StatusBuilder builder = FailedPreconditionErrorBuilder(ORVEX_LOC);
   if (verbose) {
     builder << "Failed to find component with " << ComponentContentToString(content) << " in "
@@ -737,7 +746,7 @@ StatusOr<ImageFormat::Component> ImageFormat::GetComponentFor(ComponentContent c
 
 Status ImageFormat::IsYuv(bool verbose) const {
   const auto has = [this](ComponentContent content) {
-    return GetComponentForInternal(content).has_value();
+    return FindComponent(components_, content) != nullptr;
   };
   const bool uncompressed = has(ComponentContent::kLuma) && has(ComponentContent::kChromaB) &&
                             has(ComponentContent::kChromaR);
@@ -784,8 +793,8 @@ Status ImageFormat::ConformsTo(ChromaSubsampling expected, bool verbose) const {
                             OptionalChromaSubsamplingToString(chroma_subsampling_));
   }
   // Compressed layouts are not measured.
-  if (GetComponentForInternal(ComponentContent::kCompressedLumaPayload).has_value() &&
-      GetComponentForInternal(ComponentContent::kCompressedChromaPayload).has_value()) {
+  if (FindComponent(components_, ComponentContent::kCompressedLumaPayload) != nullptr &&
+      FindComponent(components_, ComponentContent::kCompressedChromaPayload) != nullptr) {
     return OkStatus();
   }
   ORVEX_CONFORMANCE_GET(luma, ComponentContent::kLuma);
@@ -924,7 +933,7 @@ Status ImageFormat::ConformsTo(HalPixelFormat target, bool verbose) const {
       return conformance.Fail(
           "There is no sensibe way to say if a format conforms to IMPLEMENTATION_DEFINED");
     case RuleSet::kBlob:
-      if (GetComponentForInternal(CC::kUnspecified).has_value()) return OkStatus();
+      if (FindComponent(components_, CC::kUnspecified) != nullptr) return OkStatus();
       return conformance.Fail("BLOB should have at least 1 unspecified component");
     case RuleSet::kRaw:
       ORVEX_CONFORMANCE_CALL(IsRaw(verbose));
