@@ -17,6 +17,7 @@
 #include "orvex/api/memory/hal_pixel_format.h"
 #include "orvex/status/status_matchers.h"
 #include "tools/orvex/args.h"
+#include "tools/orvex/demo.h"
 #include "tools/orvex/format_names.h"
 #include "tools/orvex/json.h"
 #include "tools/orvex/layout_svg.h"
@@ -246,7 +247,7 @@ TEST(ToolTest, TopLevelUsageAndUnknownCommand) {
 
 TEST(ToolTest, EveryCommandHasHelp) {
   for (const Command* command :
-       {&FormatsCommand(), &LayoutCommand(), &PyramidCommand(), &CpaCommand()}) {
+       {&DemoCommand(), &FormatsCommand(), &LayoutCommand(), &PyramidCommand(), &CpaCommand()}) {
     const std::string name(command->spec.name);
     SCOPED_TRACE(name);
     RunResult result = RunOrvex({name, "--help"});
@@ -650,6 +651,156 @@ TEST(CpaTest, UnreadableAndCorruptFilesAreErrors) {
                                 "CameraPerformanceDataFile message (" +
                                 std::to_string(c.bytes.size()) + " bytes)\n");
     }
+  }
+}
+
+}  // namespace
+}  // namespace orvex_tool
+
+namespace orvex_tool {
+namespace {
+
+TEST(DemoTest, PercentileIsNearestRank) {
+  std::vector<absl::Duration> values;
+  for (int i = 100; i >= 1; --i) values.push_back(absl::Milliseconds(i));
+  EXPECT_EQ(Percentile({}, 0.5), absl::ZeroDuration());
+  EXPECT_EQ(Percentile({absl::Seconds(3)}, 0.99), absl::Seconds(3));
+  EXPECT_EQ(Percentile(values, 0.5), absl::Milliseconds(50));
+  EXPECT_EQ(Percentile(values, 0.99), absl::Milliseconds(99));
+  EXPECT_EQ(Percentile(values, 1.0), absl::Milliseconds(100));
+}
+
+TEST(DemoTest, EveryPlaneOfEveryLayoutFamilyIsVerified) {
+  ScratchDir dir;
+  struct Case {
+    orvex::HalPixelFormat format;
+    int planes;  // distinct runs of bytes written and checked per frame
+  };
+  const Case cases[] = {
+      {orvex::HalPixelFormat::YCBCR_420_888, 2},  // luma + interleaved chroma
+      {orvex::HalPixelFormat::YCBCR_P010, 2},     // one buffer, two planes
+      {orvex::HalPixelFormat::YV12, 3},
+      {orvex::HalPixelFormat::YCBCR_422_I, 1},
+      {orvex::HalPixelFormat::RAW10, 1},
+      {orvex::HalPixelFormat::BLOB, 1},
+      {orvex::HalPixelFormat::YCBCR_420_SP_M_SBWC, 4},  // headers and payloads
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(orvex::FormatToString(c.format));
+    DemoOptions options;
+    options.size = {64, 32};
+    options.format = c.format;
+    options.frames = 5;
+    options.out_dir = dir.path();
+    auto report = RunDemo(options);
+    ASSERT_THAT(report.status(), IsOk());
+    EXPECT_EQ(report->frames_processed, 5);
+    EXPECT_EQ(report->frames_verified, 5);
+    EXPECT_EQ(report->planes_checked, 5 * c.planes);
+    EXPECT_THAT(report->failures, ElementsAre());
+    EXPECT_EQ(report->wake_latencies.size(), 5u);
+    EXPECT_THAT(report->cpa_path, StartsWith(dir.path() + "/camera-ended-"));
+  }
+}
+
+TEST(DemoTest, CorruptedFrameFailsVerification) {
+  ScratchDir dir;
+  DemoOptions options;
+  options.size = {64, 32};
+  options.format = orvex::HalPixelFormat::YV12;
+  options.frames = 4;
+  options.out_dir = dir.path();
+  options.corrupt_frame = 2;
+  auto report = RunDemo(options);
+  ASSERT_THAT(report.status(), IsOk());
+  EXPECT_EQ(report->frames_processed, 4);
+  EXPECT_EQ(report->frames_verified, 3);
+  EXPECT_THAT(report->failures,
+              ElementsAre("frame 2: plane 2 (ChromaB, buffer 0, offset 2560, 512 bytes) checksum "
+                          "mismatch"));
+}
+
+TEST(DemoTest, CommandReportsAndWritesAReadableProfile) {
+  ScratchDir dir;
+  const std::string out = dir.path() + "/nested/out";
+  RunResult result =
+      RunOrvex({"demo", "--size", "64x32", "--frames", "3", "--format", "yv12", "--out", out});
+  ASSERT_EQ(result.code, kExitOk) << result.err;
+  EXPECT_EQ(result.err, "");
+  EXPECT_THAT(result.out,
+              testing::MatchesRegex(
+                  "orvex demo: 3 frames of YV12 64x32 \\(1 buffer, 3072 bytes per frame\\)\n"
+                  "frames processed: 3\n"
+                  "verification: passed \\(3 of 3 frames, 9 plane checksums\\)\n"
+                  "throughput: [0-9.]+ frames/s, [0-9.]+ MB/s \\([0-9.]+ s in all\\)\n"
+                  "signal-to-wake latency: median [0-9.]+ ms, p99 [0-9.]+ ms\n"
+                  "latency profile: (.*/camera-ended-[0-9_-]+\\.cpa)\n"
+                  "  read it back with: orvex cpa .*\\.cpa\n"));
+  const std::string marker = "latency profile: ";
+  const size_t at = result.out.find(marker) + marker.size();
+  const std::string cpa = result.out.substr(at, result.out.find('\n', at) - at);
+  EXPECT_THAT(cpa, StartsWith(out + "/camera-ended-"));
+
+  RunResult read = RunOrvex({"cpa", cpa});
+  ASSERT_EQ(read.code, kExitOk) << read.err;
+  EXPECT_THAT(read.out, AllOf(testing::ContainsRegex("\nDemo-Open +Overall +[0-9.]+\n"),
+                              testing::ContainsRegex("\nDemo-Process +WakeLatencyP99 +[0-9.]+\n"),
+                              testing::ContainsRegex("\nDemo-Close +Overall +[0-9.]+\n"),
+                              HasSubstr("latency data: 3 operations, 9 events\n")));
+}
+
+TEST(DemoTest, TraceRecordsFramesAndFenceWaits) {
+  ScratchDir dir;
+  const std::string trace = dir.path() + "/trace.json";
+  RunResult result =
+      RunOrvex({"demo", "--size", "64x32", "--frames", "2", "--out", dir.path(), "--trace", trace});
+  ASSERT_EQ(result.code, kExitOk) << result.err;
+  EXPECT_THAT(result.out, HasSubstr("trace: " + trace + " (open it in the Perfetto UI"));
+  const std::string json = ReadFile(trace);
+  EXPECT_THAT(json, AllOf(StartsWith("["), HasSubstr("\"orvex demo: produce frame\""),
+                          HasSubstr("\"orvex demo: consume frame\""),
+                          HasSubstr("\"orvex demo: frames verified\"")));
+}
+
+TEST(DemoTest, Errors) {
+  ScratchDir dir;
+  const std::string file = dir.path() + "/plain-file";
+  WriteFile(file, "x");
+  struct Case {
+    std::vector<std::string> args;
+    std::string err;
+  };
+  const std::string hint = "\nRun 'orvex demo --help' for usage.\n";
+  const Case cases[] = {
+      {{"demo", "--size", "64"}, "orvex demo: --size must look like WIDTHxHEIGHT, got '64'" + hint},
+      {{"demo", "--frames", "0"},
+       "orvex demo: --frames must be between 1 and 100000, got 0" + hint},
+      {{"demo", "--format", "nope"},
+       "orvex demo: unknown --format 'nope' (see 'orvex formats' for the names, or give a code)" +
+           hint},
+      {{"demo", "--out="}, "orvex demo: --out must name a directory" + hint},
+      {{"demo", "extra"}, "orvex demo: unexpected argument 'extra'" + hint},
+      {{"demo", "--format", "RGB_888", "--out", dir.path()},
+       "UNIMPLEMENTED: Unsupported HalPixelFormat: RGB_888, unable to make ImageFormat.\n"},
+      {{"demo", "--size", "63x32", "--out", dir.path()},
+       "INVALID_ARGUMENT: image width should be a multiple of 2, 63 % 2 = 1; YCBCR_420_888 "
+       "dimension requirements not met\n"},
+      {{"demo", "--size", "30000x30000", "--out", dir.path()},
+       "RESOURCE_EXHAUSTED: a 30000x30000 YCBCR_420_888 frame takes 1350000000 bytes; the demo "
+       "allows at most 1073741824 per frame\n"},
+      {{"demo", "--size", "64x32", "--frames", "1", "--out", file + "/sub"},
+       "INTERNAL: the latency analyzer wrote no .cpa file into " + file +
+           "/sub (see its [CPA] log line)\n"},
+      {{"demo", "--size", "64x32", "--trace", dir.path() + "/no/trace.json"},
+       "NOT_FOUND: cannot trace into " + dir.path() +
+           "/no/trace.json: No such file or directory\n"},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(::testing::PrintToString(c.args));
+    RunResult result = RunOrvex(c.args);
+    EXPECT_EQ(result.code, kExitError);
+    EXPECT_EQ(result.out, "");
+    EXPECT_EQ(result.err, c.err);
   }
 }
 

@@ -8,19 +8,7 @@ namespace orvex_tool {
 namespace {
 
 std::vector<const Command*> AllCommands() {
-  std::vector<const Command*> commands;
-#ifdef ORVEX_TOOL_HAVE_DEMO
-  commands.push_back(&DemoCommand());
-#endif
-  commands.push_back(&FormatsCommand());
-  commands.push_back(&LayoutCommand());
-#ifdef ORVEX_TOOL_HAVE_PYRAMID
-  commands.push_back(&PyramidCommand());
-#endif
-#ifdef ORVEX_TOOL_HAVE_CPA
-  commands.push_back(&CpaCommand());
-#endif
-  return commands;
+  return {&DemoCommand(), &FormatsCommand(), &LayoutCommand(), &PyramidCommand(), &CpaCommand()};
 }
 
 const Command* FindCommand(std::string_view name) {
