@@ -1,6 +1,7 @@
 // orvex formats and orvex layout.
 
 #include <fstream>
+#include <limits>
 #include <optional>
 #include <ostream>
 #include <string>
