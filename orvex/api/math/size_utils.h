@@ -8,7 +8,7 @@
 #include <cstddef>
 #include <cstdint>
 
-#include "orvex/status/log.h"
+#include "orvex/base/export.h"
 
 namespace orvex {
 
@@ -19,10 +19,7 @@ constexpr bool IsPowerOf2(size_t value) { return value != 0 && (value & (value -
 // Callers pass int values sign-extended to 64 bits; a negative value comes
 // back as the two's-complement form of its rounded value.
 // Precondition: `alignment` is a power of 2 (fatal otherwise).
-inline size_t AlignToPower2(size_t value, size_t alignment) {
-  ORVEX_CHECK(IsPowerOf2(alignment)) << "alignment value: " << alignment << " is not a power of 2";
-  return (value + alignment - 1) & ~(alignment - 1);
-}
+ORVEX_EXPORT size_t AlignToPower2(size_t value, size_t alignment);
 
 // AlignToPower2 over a signed 64-bit value (int inputs widened without
 // loss), returning the signed result.
