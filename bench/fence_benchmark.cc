@@ -32,9 +32,7 @@ namespace {
 struct SoftwareFenceKind {
   using Slot = orvex::SoftwareFence;
   static void Signal(Slot& s) { s.Signal(orvex::OkStatus()); }
-  static void Wait(Slot& s) {
-    benchmark::DoNotOptimize(s.WaitForDone(absl::InfiniteDuration()));
-  }
+  static void Wait(Slot& s) { benchmark::DoNotOptimize(s.WaitForDone(absl::InfiniteDuration())); }
   static void Renew(Slot& s) { s.Reset(""); }
 };
 
@@ -44,9 +42,7 @@ struct TwoStageKind {
     benchmark::DoNotOptimize(s->SignalReadyToStart(orvex::OkStatus()));
     benchmark::DoNotOptimize(s->SignalDone(orvex::OkStatus()));
   }
-  static void Wait(Slot& s) {
-    benchmark::DoNotOptimize(s->WaitForDone(absl::InfiniteDuration()));
-  }
+  static void Wait(Slot& s) { benchmark::DoNotOptimize(s->WaitForDone(absl::InfiniteDuration())); }
   static void Renew(Slot& s) { s.emplace(); }
 };
 

@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <memory>
 #include <mutex>
+#include <optional>
 #include <string>
 #include <utility>
 #include <variant>
@@ -66,42 +67,37 @@ SoftwareFence::SoftwareFence(std::string_view name)
 }
 
 SoftwareFence::~SoftwareFence() {
-  std::unique_lock<std::mutex> lock(mutex_);
-  if (signals_in_flight_ == 0) return;
-  if (fence_internal::ListenerScope::IsRunningListenersOf(this)) {
-    ORVEX_LOG(FATAL) << "SoftwareFence \"" << name_
-                     << "\" destroyed by one of its own listeners while being signalled";
-  }
-  cond_.wait(lock, [this] { return signals_in_flight_ == 0; });
+  if (active_signals_.load(std::memory_order_acquire) == 0) return;
+  fence_internal::AwaitActiveSignals(active_signals_, this, "SoftwareFence \"" + name_ + "\"");
 }
 
 void SoftwareFence::Signal(Status status) {
   std::vector<FenceListener> listeners;
+  std::optional<fence_internal::ActiveSignal> active;
   {
     std::lock_guard<std::mutex> lock(mutex_);
     signaled_ = true;
     status_ = std::move(status);
-    if (listeners_.empty()) {
-      // Nothing runs outside the lock: wake waiters now. A notification
-      // without waiters makes no system call.
-      cond_.notify_all();
-      return;
+    active.emplace(active_signals_);
+    if (!listeners_.empty()) {
+      listeners.swap(listeners_);
+      status = status_;
+      ++listeners_running_;
     }
-    listeners.swap(listeners_);
-    status = status_;
-    ++signals_in_flight_;
   }
-  {
-    fence_internal::ListenerScope scope(this);
-    for (FenceListener& listener : listeners) fence_internal::CallListener(listener, status);
-  }
-  {
-    // Waking under the lock: once a waiter can observe the end of this
-    // signal, this thread no longer touches the fence.
+  if (!listeners.empty()) {
+    {
+      fence_internal::ListenerScope scope(this);
+      for (FenceListener& listener : listeners) fence_internal::CallListener(listener, status);
+    }
     std::lock_guard<std::mutex> lock(mutex_);
-    --signals_in_flight_;
-    cond_.notify_all();
+    --listeners_running_;
   }
+  // Waiters wake after every listener has returned. A notification without
+  // waiters makes no system call.
+  cond_.notify_all();
+  active.reset();
+  // The taken listeners are destroyed last, outside the fence.
 }
 
 void SoftwareFence::Abort() { Signal(AbortedError("Fence was aborted")); }
@@ -126,7 +122,7 @@ FenceWaitResult SoftwareFence::WaitForDone(absl::Duration timeout) const {
     return orvex_api::FenceNotDone{};
   }
   // A blocked waiter wakes only once every listener of the signal has run.
-  const auto done = [this] { return signaled_ && signals_in_flight_ == 0; };
+  const auto done = [this] { return signaled_ && listeners_running_ == 0; };
   const std::optional<std::chrono::steady_clock::time_point> deadline =
       fence_internal::DeadlineAfter(timeout, absl::Microseconds(1));
   if (!deadline.has_value()) {

@@ -19,6 +19,7 @@
 // Thread safety: every operation of the fences here may be called from any
 // thread. Listeners never run while a fence's lock is held.
 
+#include <atomic>
 #include <condition_variable>
 #include <cstdint>
 #include <functional>
@@ -110,10 +111,10 @@ class ORVEX_EXPORT SoftwareFence : public Fence {
   // Named "unnamed".
   SoftwareFence();
   explicit SoftwareFence(std::string_view name);
-  // Pending listeners are destroyed without being called. If a Signal() is
-  // still calling listeners on another thread, waits for it to finish with
-  // the fence; destroying the fence from one of its own listeners ends the
-  // process.
+  // Pending listeners are destroyed without being called. If a Signal() on
+  // another thread still calls listeners or wakes waiters, waits for it to
+  // finish with the fence; destroying the fence from one of its own
+  // listeners ends the process.
   ~SoftwareFence() override;
 
   SoftwareFence(const SoftwareFence&) = delete;
@@ -149,9 +150,12 @@ class ORVEX_EXPORT SoftwareFence : public Fence {
   Status status_;
   std::string name_;
   std::vector<FenceListener> listeners_;
-  // Signal() calls still running listeners outside the lock. Blocked waiters
-  // wake only when this is zero, and the destructor waits for it.
-  int signals_in_flight_ = 0;
+  // Signal() calls running listeners outside the lock; blocked waiters wake
+  // only when it is zero.
+  int listeners_running_ = 0;
+  // Signal() calls that may still touch the fence; the destructor waits for
+  // them. Not guarded.
+  std::atomic<int> active_signals_{0};
 };
 
 }  // namespace orvex

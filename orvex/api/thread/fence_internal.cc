@@ -1,9 +1,12 @@
 #include "orvex/api/thread/fence_internal.h"
 
+#include <atomic>
 #include <chrono>
 #include <optional>
+#include <thread>
 
 #include "absl/time/time.h"
+#include "orvex/status/log.h"
 
 namespace orvex {
 namespace fence_internal {
@@ -35,6 +38,15 @@ bool ListenerScope::IsRunningListenersOf(const void* fence) {
     if (scope->fence_ == fence) return true;
   }
   return false;
+}
+
+void AwaitActiveSignals(const std::atomic<int>& count, const void* fence, std::string_view what) {
+  if (count.load(std::memory_order_acquire) == 0) return;
+  if (ListenerScope::IsRunningListenersOf(fence)) {
+    ORVEX_LOG(FATAL) << what << " destroyed by one of its own listeners while being signalled";
+  }
+  // The signaller is at most a few instructions and one wake-up away.
+  while (count.load(std::memory_order_acquire) != 0) std::this_thread::yield();
 }
 
 }  // namespace fence_internal

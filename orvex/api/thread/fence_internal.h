@@ -3,8 +3,10 @@
 
 // Helpers shared by the fence kinds of this directory. Not exported.
 
+#include <atomic>
 #include <chrono>
 #include <optional>
+#include <string_view>
 #include <utility>
 
 #include "absl/time/time.h"
@@ -41,6 +43,27 @@ class ListenerScope {
   const void* fence_;
   ListenerScope* outer_;
 };
+
+// Counts a signalling call that may still touch its fence after releasing
+// the fence's lock (to wake waiters). Enter it while holding the lock.
+class ActiveSignal {
+ public:
+  explicit ActiveSignal(std::atomic<int>& count) : count_(count) {
+    count_.fetch_add(1, std::memory_order_relaxed);
+  }
+  ~ActiveSignal() { count_.fetch_sub(1, std::memory_order_release); }
+  ActiveSignal(const ActiveSignal&) = delete;
+  ActiveSignal& operator=(const ActiveSignal&) = delete;
+
+ private:
+  std::atomic<int>& count_;
+};
+
+// Called by a fence's destructor: waits until no signalling call touches
+// `fence` any more. A fence destroyed by one of its own listeners would wait
+// for itself; that ends the process with "<what> destroyed by one of its own
+// listeners while being signalled".
+void AwaitActiveSignals(const std::atomic<int>& count, const void* fence, std::string_view what);
 
 }  // namespace fence_internal
 }  // namespace orvex

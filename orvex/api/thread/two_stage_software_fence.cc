@@ -1,5 +1,6 @@
 #include "orvex/api/thread/two_stage_software_fence.h"
 
+#include <atomic>
 #include <mutex>
 #include <optional>
 #include <string>
@@ -15,13 +16,7 @@
 namespace orvex {
 
 TwoStageSoftwareFence::~TwoStageSoftwareFence() {
-  std::unique_lock<std::mutex> lock(mutex_);
-  if (signals_in_flight_ == 0) return;
-  if (fence_internal::ListenerScope::IsRunningListenersOf(this)) {
-    ORVEX_LOG(FATAL)
-        << "TwoStageSoftwareFence destroyed by one of its own listeners while being signalled";
-  }
-  cond_.wait(lock, [this] { return signals_in_flight_ == 0; });
+  fence_internal::AwaitActiveSignals(active_signals_, this, "TwoStageSoftwareFence");
 }
 
 FenceWaitResult TwoStageSoftwareFence::WaitForDone(absl::Duration timeout) const {
@@ -32,7 +27,7 @@ FenceWaitResult TwoStageSoftwareFence::WaitForDone(absl::Duration timeout) const
     return orvex_api::FenceNotDone{};
   }
   // A blocked waiter wakes only once every listener of SignalDone has run.
-  const auto done = [this] { return done_status_.has_value() && signals_in_flight_ == 0; };
+  const auto done = [this] { return done_status_.has_value() && listeners_running_ == 0; };
   const auto deadline = fence_internal::DeadlineAfter(timeout, absl::Milliseconds(1));
   if (!deadline.has_value()) {
     cond_.wait(lock, done);
@@ -55,16 +50,19 @@ Status TwoStageSoftwareFence::AddListener(FenceListener listener) {
 }
 
 void TwoStageSoftwareFence::Abort() {
-  std::lock_guard<std::mutex> lock(mutex_);
-  ready_to_start_status_ = AbortedError("Fence was aborted");
-  done_status_ = *ready_to_start_status_;
-  // Waking under the lock: a waiter that sees the change may destroy the
-  // fence as soon as the lock is released.
+  std::optional<fence_internal::ActiveSignal> active;
+  {
+    std::lock_guard<std::mutex> lock(mutex_);
+    ready_to_start_status_ = AbortedError("Fence was aborted");
+    done_status_ = *ready_to_start_status_;
+    active.emplace(active_signals_);
+  }
   cond_.notify_all();
 }
 
 Status TwoStageSoftwareFence::SignalReadyToStart(Status status) {
-  std::lock_guard<std::mutex> lock(mutex_);
+  std::optional<fence_internal::ActiveSignal> active;
+  std::unique_lock<std::mutex> lock(mutex_);
   if (ready_to_start_status_.has_value()) {
     if (!ready_to_start_status_->ok()) {
       // The first error stays; a later one changes nothing.
@@ -82,15 +80,23 @@ Status TwoStageSoftwareFence::SignalReadyToStart(Status status) {
   }
   ready_to_start_status_ = std::move(status);
   // An error at ready-to-start finishes the fence.
+  bool wake = ready_waiters_ > 0;
   if (!ready_to_start_status_->ok() && !done_status_.has_value()) {
     done_status_ = *ready_to_start_status_;
+    wake = true;
   }
-  cond_.notify_all();
+  // Waiters for done have nothing to see in an OK ready-to-start.
+  if (wake) {
+    active.emplace(active_signals_);
+    lock.unlock();
+    cond_.notify_all();
+  }
   return OkStatus();
 }
 
 Status TwoStageSoftwareFence::SignalDone(Status status) {
   std::vector<FenceListener> listeners;
+  std::optional<fence_internal::ActiveSignal> active;
   {
     std::lock_guard<std::mutex> lock(mutex_);
     if (!ready_to_start_status_.has_value()) {
@@ -107,36 +113,41 @@ Status TwoStageSoftwareFence::SignalDone(Status status) {
           done_status_->ToString() + " New status = " + status.ToString());
     }
     done_status_ = std::move(status);
-    if (listeners_.empty()) {
-      cond_.notify_all();
-      return OkStatus();
+    active.emplace(active_signals_);
+    if (!listeners_.empty()) {
+      listeners.swap(listeners_);
+      status = *done_status_;
+      ++listeners_running_;
     }
-    listeners.swap(listeners_);
-    status = *done_status_;
-    ++signals_in_flight_;
   }
-  {
-    fence_internal::ListenerScope scope(this);
-    for (FenceListener& listener : listeners) fence_internal::CallListener(listener, status);
-  }
-  {
+  if (!listeners.empty()) {
+    {
+      fence_internal::ListenerScope scope(this);
+      for (FenceListener& listener : listeners) fence_internal::CallListener(listener, status);
+    }
     std::lock_guard<std::mutex> lock(mutex_);
-    --signals_in_flight_;
-    cond_.notify_all();
+    --listeners_running_;
   }
+  // Waiters wake after every listener has returned.
+  cond_.notify_all();
+  active.reset();
   return OkStatus();
 }
 
 bool TwoStageSoftwareFence::WaitForReadyLocked(std::unique_lock<std::mutex>& lock,
                                                absl::Duration timeout) const {
   const auto ready = [this] { return ready_to_start_status_.has_value(); };
-  if (timeout <= absl::ZeroDuration()) return ready();
+  if (timeout <= absl::ZeroDuration() || ready()) return ready();
   const auto deadline = fence_internal::DeadlineAfter(timeout, absl::Milliseconds(1));
+  ++ready_waiters_;
+  bool arrived = true;
   if (!deadline.has_value()) {
     cond_.wait(lock, ready);
-    return true;
+  } else {
+    arrived = cond_.wait_until(lock, *deadline, ready);
   }
-  return cond_.wait_until(lock, *deadline, ready);
+  --ready_waiters_;
+  return arrived;
 }
 
 Status TwoStageSoftwareFence::ReadyTimeoutError(absl::Duration timeout) {

@@ -18,6 +18,7 @@
 //
 // Thread safety: every operation may be called from any thread.
 
+#include <atomic>
 #include <condition_variable>
 #include <mutex>
 #include <optional>
@@ -34,7 +35,8 @@ class ORVEX_EXPORT TwoStageSoftwareFence : public Fence {
  public:
   TwoStageSoftwareFence() = default;
   // Pending listeners are destroyed without being called. Waits for a
-  // SignalDone() still calling listeners on another thread.
+  // signalling call on another thread that still calls listeners or wakes
+  // waiters; destroying the fence from its own listener ends the process.
   ~TwoStageSoftwareFence() override;
 
   TwoStageSoftwareFence(const TwoStageSoftwareFence&) = delete;
@@ -80,8 +82,14 @@ class ORVEX_EXPORT TwoStageSoftwareFence : public Fence {
   std::optional<Status> done_status_;
   std::optional<Status> ready_to_start_status_;
   std::vector<FenceListener> listeners_;
-  // SignalDone() calls still running listeners outside the lock.
-  int signals_in_flight_ = 0;
+  // SignalDone() calls running listeners outside the lock; blocked done
+  // waiters wake only when it is zero.
+  int listeners_running_ = 0;
+  // Threads blocked in a ready-to-start wait.
+  mutable int ready_waiters_ = 0;
+  // Signalling calls that may still touch the fence; the destructor waits
+  // for them. Not guarded.
+  std::atomic<int> active_signals_{0};
 };
 
 }  // namespace orvex
