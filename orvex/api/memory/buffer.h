@@ -39,6 +39,8 @@
 
 namespace orvex {
 
+class Allocator;
+
 class ORVEX_EXPORT Buffer : public std::enable_shared_from_this<Buffer>,
                             public Fence,
                             public Printable {
@@ -119,6 +121,12 @@ class ORVEX_EXPORT Buffer : public std::enable_shared_from_this<Buffer>,
 
   // {type: Buffer, Size: <n>, FD: <fd>, Attributes: <AttributeStr()>}
   std::string DebugStr() const override;
+
+  // Asks an allocator for one buffer. Provided (in allocation_spec.h, which
+  // callers include) for the arguments (Allocator* allocator, uint64_t& size,
+  // AllocationSpec::Flags flags, FenceType fence_type).
+  template <typename... Args>
+  static StatusOr<std::shared_ptr<Buffer>> Allocate(Args&&... args);
 
   uint64_t GetSize() const { return size_; }
   const BufferAttributes& GetAttributes() const { return attributes_; }
