@@ -20,7 +20,9 @@
 #include "fmt/format.h"
 #include "orvex/api/debug/camera_latency_analyzer.h"
 #include "orvex/api/debug/perf_trace.h"
+#include "orvex/api/memory/allocation_spec.h"
 #include "orvex/api/memory/buffer.h"
+#include "orvex/api/memory/heap_allocator.h"
 #include "orvex/api/memory/image.h"
 #include "orvex/api/memory/image_format.h"
 #include "orvex/api/thread/fence.h"
@@ -115,19 +117,13 @@ uint64_t ChecksumPlane(const uint8_t* data, size_t size) {
 }
 
 // One heap buffer with its own software fence per buffer of the format.
-orvex::StatusOr<std::shared_ptr<Image>> MakeFrameImage(const ImageFormat& format, int frame) {
-  const orvex::BufferCompression compression =
-      orvex::HalPixelFormatToBufferCompression(format.format());
-  std::vector<std::shared_ptr<orvex::Buffer>> buffers;
-  for (size_t b = 0; b < format.buffer_sizes().size(); ++b) {
-    ORVEX_ASSIGN_OR_RETURN(
-        std::shared_ptr<orvex::HeapBuffer<uint8_t>> buffer,
-        orvex::HeapBuffer<uint8_t>::Make(
-            format.buffer_sizes()[b], compression,
-            std::make_unique<orvex::SoftwareFence>(fmt::format("frame {} buffer {}", frame, b))));
-    buffers.push_back(std::move(buffer));
-  }
-  return Image::Make(format, Image::Sideband{}, std::move(buffers));
+orvex::StatusOr<std::shared_ptr<Image>> MakeFrameImage(orvex::HeapAllocator& allocator,
+                                                       const ImageFormat& format) {
+  ORVEX_ASSIGN_OR_RETURN(
+      orvex::Allocation allocation,
+      allocator.Allocate(orvex::AllocationSpec(format, 0, orvex::FenceType::kSoftware)));
+  return Image::Make(allocation.image_format.value_or(format), Image::Sideband{},
+                     std::move(allocation.buffers));
 }
 
 struct Frame {
@@ -189,6 +185,7 @@ orvex::Status WriteFrame(Frame& frame, const std::vector<Plane>& planes, bool co
 
 // Everything the two threads share.
 struct Pipeline {
+  std::shared_ptr<orvex::HeapAllocator> allocator;
   const ImageFormat* format;
   const std::vector<Plane>* planes;
   const DemoOptions* options;
@@ -201,7 +198,7 @@ struct Pipeline {
 void Produce(Pipeline& pipeline) {
   for (int i = 0; i < pipeline.options->frames; ++i) {
     orvex::ScopedTrace trace("orvex demo: produce frame");
-    auto image = MakeFrameImage(*pipeline.format, i);
+    auto image = MakeFrameImage(*pipeline.allocator, *pipeline.format);
     if (!image.ok()) {
       pipeline.producer_status = image.status();
       break;
@@ -336,13 +333,15 @@ orvex::StatusOr<DemoReport> RunDemo(const DemoOptions& options) {
   }
   const std::vector<Plane> planes = PlanesOf(format);
 
-  Pipeline pipeline{.format = &format,
-                    .planes = &planes,
-                    .options = &options,
-                    .queue = {},
-                    .producer_status = orvex::OkStatus(),
-                    .report = &report,
-                    .first_verified = {}};
+  Pipeline pipeline{
+      .allocator = std::make_shared<orvex::HeapAllocator>(orvex::FenceType::kSoftware),
+      .format = &format,
+      .planes = &planes,
+      .options = &options,
+      .queue = {},
+      .producer_status = orvex::OkStatus(),
+      .report = &report,
+      .first_verified = {}};
   const Clock::time_point threads_start = Clock::now();
   std::thread consumer(Consume, std::ref(pipeline));
   std::thread producer(Produce, std::ref(pipeline));
