@@ -47,6 +47,23 @@ RunResult RunOrvex(std::vector<std::string> args) {
   return {code, out.str(), err.str()};
 }
 
+// A command line that must fail with exit status 2, nothing on stdout and
+// exactly `err` on stderr.
+struct ErrorCase {
+  std::vector<std::string> args;
+  std::string err;
+};
+
+void ExpectErrors(const std::vector<ErrorCase>& cases) {
+  for (const ErrorCase& c : cases) {
+    SCOPED_TRACE(::testing::PrintToString(c.args));
+    RunResult result = RunOrvex(c.args);
+    EXPECT_EQ(result.code, kExitError);
+    EXPECT_EQ(result.out, "");
+    EXPECT_EQ(result.err, c.err);
+  }
+}
+
 std::string ReadFile(const std::string& path) {
   std::ifstream in(path, std::ios::binary);
   std::stringstream buffer;
@@ -401,11 +418,7 @@ TEST(LayoutTest, ConformanceVerdictAndExitStatus) {
 }
 
 TEST(LayoutTest, ErrorsGoToStderrWithExitTwo) {
-  struct Case {
-    std::vector<std::string> args;
-    std::string err;
-  };
-  const Case cases[] = {
+  ExpectErrors({
       {{"layout", "30", "32", "YV12"},
        "INVALID_ARGUMENT: image width should be a multiple of 4, 30 % 4 = 2; YV12 dimension "
        "requirements not met\n"},
@@ -435,14 +448,7 @@ TEST(LayoutTest, ErrorsGoToStderrWithExitTwo) {
       {{"layout", "64", "64"},
        "orvex layout: expected 3 arguments (WIDTH HEIGHT FORMAT), got 2\nRun 'orvex layout "
        "--help' for usage.\n"},
-  };
-  for (const Case& c : cases) {
-    SCOPED_TRACE(::testing::PrintToString(c.args));
-    RunResult result = RunOrvex(c.args);
-    EXPECT_EQ(result.code, kExitError);
-    EXPECT_EQ(result.out, "");
-    EXPECT_EQ(result.err, c.err);
-  }
+  });
 }
 
 TEST(LayoutTest, SvgDrawsEveryBufferAndComponent) {
@@ -509,12 +515,8 @@ TEST(PyramidTest, TextAndJson) {
 }
 
 TEST(PyramidTest, Errors) {
-  struct Case {
-    std::vector<std::string> args;
-    std::string err;
-  };
   const std::string hint = "\nRun 'orvex pyramid --help' for usage.\n";
-  const Case cases[] = {
+  ExpectErrors({
       {{"pyramid", "64", "64", "--alignment", "64", "--bpp", "8"},
        "orvex pyramid: --levels, --alignment and --bpp are required" + hint},
       {{"pyramid", "64", "64", "--levels", "2:1", "--alignment", "64", "--bpp", "8"},
@@ -537,14 +539,7 @@ TEST(PyramidTest, Errors) {
         "16"},
        "INVALID_ARGUMENT: buffer size of level 0 for a 2147483647x2 image does not fit in 32 "
        "bits\n"},
-  };
-  for (const Case& c : cases) {
-    SCOPED_TRACE(::testing::PrintToString(c.args));
-    RunResult result = RunOrvex(c.args);
-    EXPECT_EQ(result.code, kExitError);
-    EXPECT_EQ(result.out, "");
-    EXPECT_EQ(result.err, c.err);
-  }
+  });
 }
 
 void WriteFile(const std::string& path, const std::string& bytes) {
@@ -766,12 +761,8 @@ TEST(DemoTest, Errors) {
   ScratchDir dir;
   const std::string file = dir.path() + "/plain-file";
   WriteFile(file, "x");
-  struct Case {
-    std::vector<std::string> args;
-    std::string err;
-  };
   const std::string hint = "\nRun 'orvex demo --help' for usage.\n";
-  const Case cases[] = {
+  ExpectErrors({
       {{"demo", "--size", "64"}, "orvex demo: --size must look like WIDTHxHEIGHT, got '64'" + hint},
       {{"demo", "--frames", "0"},
        "orvex demo: --frames must be between 1 and 100000, got 0" + hint},
@@ -794,14 +785,7 @@ TEST(DemoTest, Errors) {
       {{"demo", "--size", "64x32", "--trace", dir.path() + "/no/trace.json"},
        "NOT_FOUND: cannot trace into " + dir.path() +
            "/no/trace.json: No such file or directory\n"},
-  };
-  for (const Case& c : cases) {
-    SCOPED_TRACE(::testing::PrintToString(c.args));
-    RunResult result = RunOrvex(c.args);
-    EXPECT_EQ(result.code, kExitError);
-    EXPECT_EQ(result.out, "");
-    EXPECT_EQ(result.err, c.err);
-  }
+  });
 }
 
 }  // namespace
