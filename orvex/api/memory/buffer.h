@@ -89,7 +89,8 @@ class ORVEX_EXPORT Buffer : public std::enable_shared_from_this<Buffer>,
   Buffer(const Buffer&) = delete;
   Buffer& operator=(const Buffer&) = delete;
 
-  // The fence's wait; with no fence, OK at once.
+  // The wait of the fence stored in this buffer (a proxy's own, not its
+  // source's); with no fence, OK at once.
   FenceWaitResult WaitForDone(absl::Duration timeout) const override;
   // Aborts the fence GetFence() yields, if any.
   void Abort() override;

@@ -178,6 +178,7 @@ class HwBufferTest : public ::testing::Test {
     saved_mapper_ = std::exchange(HwBuffer::mapper_, std::move(mapper));
     TakeSyncCalls();
     ScriptSyncErrnos({});
+    ASSERT_GE(fd_.get(), 0);
   }
   void TearDown() override {
     HwBuffer::mapper_ = std::move(saved_mapper_);
@@ -191,14 +192,14 @@ class HwBufferTest : public ::testing::Test {
     return *std::move(buffer);
   }
 
+  // A 4 KiB memfd: real shared memory behind a descriptor.
+  ScopedFd fd_ = MakeMemfd(kSize);
   RecordingMapper* mapper_ = nullptr;
   std::unique_ptr<MemoryMapper> saved_mapper_;
 };
 
 TEST_F(HwBufferTest, MapsOncePerModeAndUnmapsWhenTheBufferDies) {
-  ScopedFd fd = MakeMemfd(kSize);
-  ASSERT_GE(fd.get(), 0);
-  auto buffer = MakeBuffer(fd.get());
+  auto buffer = MakeBuffer(fd_.get());
   std::weak_ptr<HwBuffer> weak = buffer;
   {
     auto writer = buffer->Map(100, 16, BufferAccessMode::kWrite);
@@ -212,7 +213,7 @@ TEST_F(HwBufferTest, MapsOncePerModeAndUnmapsWhenTheBufferDies) {
   EXPECT_STREQ(static_cast<const char*>((*first)->data()) + 100, "camera frame 01");
   EXPECT_STREQ(static_cast<const char*>((*second)->data()) + 4, "camera frame 01");
   // A second buffer over the descriptor maps it again and sees the same bytes.
-  auto other = MakeBuffer(fd.get());
+  auto other = MakeBuffer(fd_.get());
   auto other_reader = other->Map(100, 16, BufferAccessMode::kReadWrite);
   ASSERT_THAT(other_reader, IsOk());
   EXPECT_STREQ(static_cast<const char*>((*other_reader)->data()), "camera frame 01");
@@ -231,10 +232,8 @@ TEST_F(HwBufferTest, MapsOncePerModeAndUnmapsWhenTheBufferDies) {
 }
 
 TEST_F(HwBufferTest, RangesAreCheckedBeforeMapping) {
-  ScopedFd fd = MakeMemfd(kSize);
-  ASSERT_GE(fd.get(), 0);
-  auto buffer = MakeBuffer(fd.get());
-  auto huge = MakeBuffer(fd.get(), uint64_t{1} << 33);
+  auto buffer = MakeBuffer(fd_.get());
+  auto huge = MakeBuffer(fd_.get(), uint64_t{1} << 33);
   struct Case {
     std::shared_ptr<HwBuffer> buffer;
     int64_t offset;
@@ -289,9 +288,7 @@ TEST_F(HwBufferTest, MappingFailures) {
                                    read_end.get())));
 
   // A read-only descriptor maps for reading but not for writing.
-  ScopedFd memfd = MakeMemfd(kSize);
-  ASSERT_GE(memfd.get(), 0);
-  ScopedFd read_only(open(fmt::format("/proc/self/fd/{}", memfd.get()).c_str(), O_RDONLY));
+  ScopedFd read_only(open(fmt::format("/proc/self/fd/{}", fd_.get()).c_str(), O_RDONLY));
   ASSERT_GE(read_only.get(), 0);
   auto read_only_buffer = MakeBuffer(read_only.get());
   EXPECT_THAT(read_only_buffer->Map(0, kSize, BufferAccessMode::kWrite),
@@ -309,9 +306,7 @@ TEST_F(HwBufferTest, MappingFailures) {
 }
 
 TEST_F(HwBufferTest, CacheMaintenanceBracketsEachAccess) {
-  ScopedFd fd = MakeMemfd(kSize);
-  ASSERT_GE(fd.get(), 0);
-  auto buffer = MakeBuffer(fd.get());
+  auto buffer = MakeBuffer(fd_.get());
   struct Case {
     BufferAccessMode mode;
     std::vector<uint64_t> at_map;
@@ -337,9 +332,9 @@ TEST_F(HwBufferTest, CacheMaintenanceBracketsEachAccess) {
     for (int repeat = 0; repeat < 2; ++repeat) {  // the first maps, the second reuses
       auto handle = buffer->Map(0, kSize, c.mode);
       ASSERT_THAT(handle, IsOk());
-      EXPECT_EQ(flags_of(TakeSyncCalls(), fd.get()), c.at_map);
+      EXPECT_EQ(flags_of(TakeSyncCalls(), fd_.get()), c.at_map);
       handle->reset();
-      EXPECT_EQ(flags_of(TakeSyncCalls(), fd.get()), c.at_release);
+      EXPECT_EQ(flags_of(TakeSyncCalls(), fd_.get()), c.at_release);
     }
   }
   // The flag values the dma-buf interface defines.
@@ -351,8 +346,6 @@ TEST_F(HwBufferTest, CacheMaintenanceBracketsEachAccess) {
 }
 
 TEST_F(HwBufferTest, NoMaintenanceUnlessCachedCpuDma) {
-  ScopedFd fd = MakeMemfd(kSize);
-  ASSERT_GE(fd.get(), 0);
   const std::vector<BufferAttributes> uncoherent_free = {
       {BufferTransport::kDma, BufferAccess::kCpu, BufferSecurity::kNone, BufferCached::kUnCached,
        BufferCompression::kNone},
@@ -365,7 +358,7 @@ TEST_F(HwBufferTest, NoMaintenanceUnlessCachedCpuDma) {
   };
   for (const BufferAttributes& attributes : uncoherent_free) {
     SCOPED_TRACE(BufferAttributesToString(attributes));
-    auto buffer = MakeBuffer(fd.get(), kSize, attributes);
+    auto buffer = MakeBuffer(fd_.get(), kSize, attributes);
     EXPECT_FALSE(buffer->IsCached());
     for (auto mode :
          {BufferAccessMode::kRead, BufferAccessMode::kWrite, BufferAccessMode::kReadWrite}) {
@@ -375,23 +368,21 @@ TEST_F(HwBufferTest, NoMaintenanceUnlessCachedCpuDma) {
     EXPECT_THAT(TakeSyncCalls(), IsEmpty());
   }
   // Security and compression do not matter.
-  auto secure = MakeBuffer(fd.get(), kSize,
+  auto secure = MakeBuffer(fd_.get(), kSize,
                            {BufferTransport::kDma, BufferAccess::kCpu, BufferSecurity::kSecure,
                             BufferCached::kCached, BufferCompression::kAfbc});
   EXPECT_TRUE(secure->IsCached());
 }
 
 TEST_F(HwBufferTest, PartialMappingsUseTheHandler) {
-  ScopedFd fd = MakeMemfd(kSize);
-  ASSERT_GE(fd.get(), 0);
-  auto buffer = MakeBuffer(fd.get());
+  auto buffer = MakeBuffer(fd_.get());
 
   // Without a handler, a partial mapping synchronises the whole buffer.
   {
     auto handle = buffer->Map(100, 200, BufferAccessMode::kReadWrite);
     ASSERT_THAT(handle, IsOk());
   }
-  EXPECT_THAT(TakeSyncCalls(), ElementsAre(SyncCall{fd.get(), 3}, SyncCall{fd.get(), 7}));
+  EXPECT_THAT(TakeSyncCalls(), ElementsAre(SyncCall{fd_.get(), 3}, SyncCall{fd_.get(), 7}));
 
   std::vector<std::string> handled;
   HwBuffer::partial_cpu_cache_sync_handler_ = [&](const Buffer* b, bool begin, uint64_t offset,
@@ -412,7 +403,7 @@ TEST_F(HwBufferTest, PartialMappingsUseTheHandler) {
   handled.clear();
   { ASSERT_THAT(buffer->Map(0, kSize, BufferAccessMode::kWrite), IsOk()); }
   EXPECT_THAT(handled, IsEmpty());
-  EXPECT_THAT(TakeSyncCalls(), ElementsAre(SyncCall{fd.get(), 6}));
+  EXPECT_THAT(TakeSyncCalls(), ElementsAre(SyncCall{fd_.get(), 6}));
 }
 
 TEST_F(HwBufferTest, SyncRetriesOnEintr) {
@@ -425,9 +416,7 @@ TEST_F(HwBufferTest, SyncRetriesOnEintr) {
 }
 
 TEST_F(HwBufferTest, SyncFailureIsLoggedAndNotReported) {
-  ScopedFd fd = MakeMemfd(kSize);
-  ASSERT_GE(fd.get(), 0);
-  auto buffer = MakeBuffer(fd.get());
+  auto buffer = MakeBuffer(fd_.get());
 
   ScriptSyncErrnos({EINTR, EIO});
   ::testing::internal::CaptureStderr();
@@ -579,9 +568,7 @@ TEST_F(HwBufferTest, ConcurrentMappingOfOneBuffer) {
   constexpr int kThreads = 4;
   constexpr int kIterations = 300;
   constexpr uint64_t kStripe = kSize / kThreads;
-  ScopedFd fd = MakeMemfd(kSize);
-  ASSERT_GE(fd.get(), 0);
-  auto buffer = MakeBuffer(fd.get());
+  auto buffer = MakeBuffer(fd_.get());
   std::atomic<int> cleanups{0};
   std::vector<std::unique_ptr<Buffer::MappedHandle>> last(kThreads);
   std::vector<std::thread> threads;
@@ -612,7 +599,7 @@ TEST_F(HwBufferTest, ConcurrentMappingOfOneBuffer) {
   EXPECT_EQ(cleanups.load(), kThreads * (kIterations / 50));
   unsigned char stripe_start[kThreads] = {};
   for (int t = 0; t < kThreads; ++t) {
-    ASSERT_EQ(pread(fd.get(), &stripe_start[t], 1, static_cast<off_t>(t * kStripe)), 1);
+    ASSERT_EQ(pread(fd_.get(), &stripe_start[t], 1, static_cast<off_t>(t * kStripe)), 1);
   }
   EXPECT_THAT(stripe_start, ElementsAre(0, 1, 2, 3));
 }
