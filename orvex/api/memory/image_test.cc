@@ -237,47 +237,25 @@ class RoadOfOneFrameTest : public ::testing::Test {
   static constexpr int kWidth = 4000;
   static constexpr int kHeight = 3000;
 
-  static uint8_t Pattern(Content content, int x, int y) {
-    return static_cast<uint8_t>(x * 7 + y * 13 + static_cast<int>(content) * 31);
-  }
-
-  static Status WriteFrame(Image& image) {
-    auto mapped = Image::MappedImage::Make(&image, BufferAccessMode::kWrite);
-    if (!mapped.ok()) return mapped.status();
+  // Calls visit(sample, expected) for every sample of the three planes of
+  // `image` mapped in `mode`; false when a plane cannot be reached.
+  template <typename ImageT, typename Visit>
+  static bool ForEachSample(ImageT& image, BufferAccessMode mode, Visit visit) {
+    auto mapped = Image::MappedImage::Make(&image, mode);
+    if (!mapped.ok()) return false;
     for (Content content : {Content::kLuma, Content::kChromaB, Content::kChromaR}) {
       uint8_t* data = nullptr;
       auto component = GetComponentFor(mapped->get(), content, &data);
-      if (!component.ok()) return component.status();
-      if (data == nullptr) return InternalError("component not mapped");
+      if (!component.ok() || data == nullptr) return false;
       for (int y = 0; y < component->height; ++y) {
         uint8_t* row = data + static_cast<size_t>(y) * component->row_stride_bytes;
         for (int x = 0; x < component->width; ++x) {
-          row[x * component->pixel_stride + component->pixel_phase] = Pattern(content, x, y);
+          visit(row[x * component->pixel_stride + component->pixel_phase],
+                static_cast<uint8_t>(x * 7 + y * 13 + static_cast<int>(content) * 31));
         }
       }
     }
-    return OkStatus();
-  }
-
-  // Number of samples that differ from the pattern.
-  static int64_t CountMismatches(const Image& image) {
-    auto mapped = Image::MappedImage::Make(&image, BufferAccessMode::kRead);
-    if (!mapped.ok()) return -1;
-    const Image::MappedImage* read_only = mapped->get();
-    int64_t mismatches = 0;
-    for (Content content : {Content::kLuma, Content::kChromaB, Content::kChromaR}) {
-      const uint8_t* data = nullptr;
-      auto component = GetComponentFor(read_only, content, &data);
-      if (!component.ok() || data == nullptr) return -1;
-      for (int y = 0; y < component->height; ++y) {
-        const uint8_t* row = data + static_cast<size_t>(y) * component->row_stride_bytes;
-        for (int x = 0; x < component->width; ++x) {
-          mismatches +=
-              row[x * component->pixel_stride + component->pixel_phase] != Pattern(content, x, y);
-        }
-      }
-    }
-    return mismatches;
+    return true;
   }
 
   std::shared_ptr<Image> AllocateFrame() {
@@ -302,11 +280,17 @@ TEST_F(RoadOfOneFrameTest, ConsumerReadsWhatTheProducerWrote) {
   int64_t mismatches = -1;
   std::thread consumer([&] {
     consumer_status = WaitStatus(image->WaitForDone(absl::InfiniteDuration()));
-    if (consumer_status.ok()) mismatches = CountMismatches(*image);
+    if (!consumer_status.ok()) return;
+    const Image& read_only = *image;
+    mismatches = 0;
+    EXPECT_TRUE(
+        ForEachSample(read_only, BufferAccessMode::kRead,
+                      [&](uint8_t sample, uint8_t expected) { mismatches += sample != expected; }));
   });
   std::thread producer([&] {
-    Status written = WriteFrame(*image);
-    EXPECT_THAT(image->SignalFences(written), IsOk());
+    const bool written = ForEachSample(*image, BufferAccessMode::kWrite,
+                                       [](uint8_t& sample, uint8_t value) { sample = value; });
+    EXPECT_THAT(image->SignalFences(written ? OkStatus() : InternalError("not written")), IsOk());
   });
   producer.join();
   consumer.join();
