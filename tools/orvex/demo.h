@@ -2,10 +2,10 @@
 #define ORVEX_TOOLS_ORVEX_DEMO_H_
 
 // The road of one frame, for real: a heap allocator makes each frame's
-// image (heap buffers, each with a software fence); a producer thread writes every plane of each frame through
-// Image::MappedImage and signals the image's fences; a consumer thread waits
-// on the image, maps it and verifies a checksum of every plane. The run is
-// reported to the camera latency analyzer, which writes a ".cpa" file.
+// image (heap buffers, each with a software fence); a producer thread writes every plane of each
+// frame through Image::MappedImage and signals the image's fences; a consumer thread waits on the
+// image, maps it and verifies a checksum of every plane. The run is reported to the camera latency
+// analyzer, which writes a ".cpa" file.
 
 #include <cstdint>
 #include <iosfwd>

@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <cstdio>
+#include <filesystem>
 #include <fstream>
 #include <sstream>
 #include <string>
@@ -76,9 +77,16 @@ class ScratchDir {
  public:
   ScratchDir() {
     char pattern[] = "/tmp/orvex_tool_test.XXXXXX";
-    path_ = mkdtemp(pattern);
+    if (const char* made = mkdtemp(pattern)) {
+      path_ = made;
+    } else {
+      ADD_FAILURE() << "mkdtemp failed";
+    }
   }
-  ~ScratchDir() { std::system(("rm -rf '" + path_ + "'").c_str()); }
+  ~ScratchDir() {
+    std::error_code ignored;
+    if (!path_.empty()) std::filesystem::remove_all(path_, ignored);
+  }
   const std::string& path() const { return path_; }
 
  private:
