@@ -4,7 +4,9 @@
 include(GNUInstallDirs)
 include(CMakePackageConfigHelpers)
 
-install(TARGETS orvex_base orvex_platform
+# orvex_host_trace records trace markers on a host (the orvex tool's --trace);
+# it is exported too, for host programs that want to record traces.
+install(TARGETS orvex_base orvex_platform orvex_host_trace
   EXPORT orvexTargets
   LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}
   ARCHIVE DESTINATION ${CMAKE_INSTALL_LIBDIR}

@@ -14,6 +14,8 @@ cmake --build "$work/cmake" >/dev/null
 LD_LIBRARY_PATH="$prefix/lib:$prefix/lib64:${LD_LIBRARY_PATH:-}" "$work/cmake/consumer"
 export PKG_CONFIG_PATH="$prefix/lib/pkgconfig:$prefix/lib64/pkgconfig:$prefix/share/pkgconfig"
 # shellcheck disable=SC2046
-g++ -std=c++20 examples/consumer/main.cc -o "$work/pc-consumer" $(pkg-config --cflags --libs orvex)
+g++ -std=c++20 -pthread examples/consumer/main.cc -o "$work/pc-consumer" $(pkg-config --cflags --libs orvex)
 LD_LIBRARY_PATH="$prefix/lib:$prefix/lib64:${LD_LIBRARY_PATH:-}" "$work/pc-consumer"
+# The installed tool runs from the prefix without any library path set.
+"$prefix/bin/orvex" layout 64 32 YV12 --conform YV12 | tail -1
 echo "install check: passed"

@@ -1,0 +1,16 @@
+// The orvex developer tool. See tool.h for the commands and exit status.
+
+#include <unistd.h>
+
+#include <iostream>
+#include <string>
+#include <vector>
+
+#include "tools/orvex/tool.h"
+
+int main(int argc, char** argv) {
+  std::vector<std::string> args(argv + 1, argv + argc);
+  const int status = orvex_tool::RunTool(args, std::cout, std::cerr, isatty(STDERR_FILENO) == 1);
+  std::cout.flush();
+  return status;
+}

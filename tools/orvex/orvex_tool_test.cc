@@ -1,0 +1,800 @@
+// In-process tests of the orvex tool: argument parsing, output shapes and
+// error paths of every command.
+
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cstdio>
+#include <filesystem>
+#include <fstream>
+#include <sstream>
+#include <string>
+#include <vector>
+
+#include "gmock/gmock.h"
+#include "google/protobuf/util/json_util.h"
+#include "gtest/gtest.h"
+#include "orvex/api/debug/camera_performance_analyzer.pb.h"
+#include "orvex/api/memory/hal_pixel_format.h"
+#include "orvex/status/status_matchers.h"
+#include "tools/orvex/args.h"
+#include "tools/orvex/demo.h"
+#include "tools/orvex/format_names.h"
+#include "tools/orvex/json.h"
+#include "tools/orvex/layout_svg.h"
+#include "tools/orvex/table.h"
+#include "tools/orvex/tool.h"
+
+namespace orvex_tool {
+namespace {
+
+using ::orvex::testing::IsOk;
+using ::orvex::testing::StatusIs;
+using ::testing::AllOf;
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+using ::testing::StartsWith;
+
+struct RunResult {
+  int code;
+  std::string out;
+  std::string err;
+};
+
+RunResult RunOrvex(std::vector<std::string> args) {
+  std::ostringstream out;
+  std::ostringstream err;
+  const int code = RunTool(args, out, err);
+  return {code, out.str(), err.str()};
+}
+
+// A command line that must fail with exit status 2, nothing on stdout and
+// exactly `err` on stderr.
+struct ErrorCase {
+  std::vector<std::string> args;
+  std::string err;
+};
+
+void ExpectErrors(const std::vector<ErrorCase>& cases) {
+  for (const ErrorCase& c : cases) {
+    SCOPED_TRACE(::testing::PrintToString(c.args));
+    RunResult result = RunOrvex(c.args);
+    EXPECT_EQ(result.code, kExitError);
+    EXPECT_EQ(result.out, "");
+    EXPECT_EQ(result.err, c.err);
+  }
+}
+
+std::string ReadFile(const std::string& path) {
+  std::ifstream in(path, std::ios::binary);
+  std::stringstream buffer;
+  buffer << in.rdbuf();
+  return buffer.str();
+}
+
+// A scratch directory removed with its files at the end of the test.
+class ScratchDir {
+ public:
+  ScratchDir() {
+    char pattern[] = "/tmp/orvex_tool_test.XXXXXX";
+    if (const char* made = mkdtemp(pattern)) {
+      path_ = made;
+    } else {
+      ADD_FAILURE() << "mkdtemp failed";
+    }
+  }
+  ~ScratchDir() {
+    std::error_code ignored;
+    if (!path_.empty()) std::filesystem::remove_all(path_, ignored);
+  }
+  const std::string& path() const { return path_; }
+
+ private:
+  std::string path_;
+};
+
+// `text` with every run of blanks reduced to one and leading blanks dropped.
+std::string Squeeze(const std::string& text) {
+  std::string out;
+  for (char c : text) {
+    if (c == ' ' && (out.empty() || out.back() == ' ' || out.back() == '\n')) continue;
+    out += c;
+  }
+  return out;
+}
+
+const CommandSpec& TestSpec() {
+  static const CommandSpec spec = {
+      .name = "test",
+      .positionals = "A B",
+      .positional_count = 2,
+      .summary = "a test command",
+      .details = "",
+      .flags = {{"json", "", "json output"}, {"out", "DIR", "output directory"}}};
+  return spec;
+}
+
+TEST(ArgsTest, AcceptsFlagShapes) {
+  struct Case {
+    std::vector<std::string> args;
+    std::vector<std::string> positionals;
+    std::string out;
+    bool json;
+  };
+  const Case cases[] = {
+      {{"a", "b"}, {"a", "b"}, "", false},
+      {{"--out", "d", "a", "b"}, {"a", "b"}, "d", false},
+      {{"a", "--out=d=e", "b", "--json"}, {"a", "b"}, "d=e", true},
+      {{"a", "--", "--json"}, {"a", "--json"}, "", false},
+      {{"-5", "-0x10"}, {"-5", "-0x10"}, "", false},
+      {{"a", "b", "--out="}, {"a", "b"}, "", false},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(::testing::PrintToString(c.args));
+    auto parsed = ParseArgs(TestSpec(), c.args);
+    ASSERT_THAT(parsed.status(), IsOk());
+    EXPECT_EQ(parsed->positionals, c.positionals);
+    EXPECT_EQ(parsed->Get("out").value_or(""), c.out);
+    EXPECT_EQ(parsed->Has("json"), c.json);
+    EXPECT_FALSE(parsed->help);
+  }
+}
+
+TEST(ArgsTest, RefusesBadArguments) {
+  struct Case {
+    std::vector<std::string> args;
+    std::string message;
+  };
+  const Case cases[] = {
+      {{"a", "b", "--bogus"}, "unknown flag '--bogus'"},
+      {{"a", "b", "-x"}, "unknown flag '-x'"},
+      {{"a", "b", "--out"}, "flag '--out' needs a value (DIR)"},
+      {{"a", "b", "--json=1"}, "flag '--json' takes no value"},
+      {{"a", "b", "--json", "--json"}, "flag '--json' given more than once"},
+      {{"a", "b", "c"}, "unexpected argument 'c'"},
+      {{"a"}, "expected 2 arguments (A B), got 1"},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(::testing::PrintToString(c.args));
+    EXPECT_THAT(ParseArgs(TestSpec(), c.args).status(),
+                StatusIs(orvex::StatusCode::kInvalidArgument, c.message));
+  }
+}
+
+TEST(ArgsTest, HelpSkipsThePositionalCount) {
+  auto parsed = ParseArgs(TestSpec(), {"--help"});
+  ASSERT_THAT(parsed.status(), IsOk());
+  EXPECT_TRUE(parsed->help);
+  EXPECT_THAT(UsageText(TestSpec()),
+              AllOf(StartsWith("usage: orvex test A B [flags]\n\na test command\n"),
+                    HasSubstr("  --out DIR   output directory\n"),
+                    HasSubstr("  -h, --help  print this help and exit\n")));
+}
+
+TEST(ArgsTest, ParsesNumbers) {
+  EXPECT_THAT(ParseInteger("4000", "WIDTH", 1, 10000), orvex::testing::IsOkAndHolds(4000));
+  EXPECT_THAT(ParseCode("0x40000006", "FORMAT"), orvex::testing::IsOkAndHolds(0x40000006u));
+  EXPECT_THAT(ParseCode("4294967295", "FORMAT"), orvex::testing::IsOkAndHolds(0xffffffffu));
+  auto size = ParseSize("640X480", "--size");
+  ASSERT_THAT(size.status(), IsOk());
+  EXPECT_EQ(size->width, 640);
+  EXPECT_EQ(size->height, 480);
+  auto levels = ParseLevelRange("1:4", 31);
+  ASSERT_THAT(levels.status(), IsOk());
+  EXPECT_EQ(levels->lower, 1);
+  EXPECT_EQ(levels->upper, 4);
+
+  const std::pair<orvex::Status, std::string> failures[] = {
+      {ParseInteger("", "WIDTH", 1, 10).status(), "WIDTH must be a whole number, got ''"},
+      {ParseInteger("12abc", "WIDTH", 1, 10).status(), "WIDTH must be a whole number, got '12abc'"},
+      {ParseInteger("0", "WIDTH", 1, 10).status(), "WIDTH must be between 1 and 10, got 0"},
+      {ParseInteger("-3", "WIDTH", 1, 10).status(), "WIDTH must be between 1 and 10, got -3"},
+      {ParseInteger("99999999999999999999", "N", 1, 10).status(),
+       "N must be between 1 and 10, got 99999999999999999999"},
+      {ParseInteger("+5", "N", 1, 10).status(), "N must be a whole number, got '+5'"},
+      {ParseCode("0x", "FORMAT").status(),
+       "FORMAT must be a name or a decimal or 0x-hexadecimal code, got '0x'"},
+      {ParseCode("0x1g", "FORMAT").status(),
+       "FORMAT must be a name or a decimal or 0x-hexadecimal code, got '0x1g'"},
+      {ParseCode("0x100000000", "FORMAT").status(),
+       "FORMAT code does not fit in 32 bits: 0x100000000"},
+      {ParseSize("640", "--size").status(), "--size must look like WIDTHxHEIGHT, got '640'"},
+      {ParseSize("640x0", "--size").status(), "height must be between 1 and 2147483647, got 0"},
+      {ParseSize("x480", "--size").status(), "width must be a whole number, got ''"},
+      {ParseLevelRange("3", 31).status(), "--levels must look like LOW:HIGH, got '3'"},
+      {ParseLevelRange("3:1", 31).status(), "--levels LOW must not exceed HIGH, got 3:1"},
+      {ParseLevelRange("0:32", 31).status(), "HIGH must be between 0 and 31, got 32"},
+      {ParseLevelRange("-1:2", 31).status(), "LOW must be between 0 and 31, got -1"},
+  };
+  for (const auto& [status, message] : failures) {
+    SCOPED_TRACE(message);
+    EXPECT_THAT(status, StatusIs(orvex::StatusCode::kInvalidArgument, message));
+  }
+}
+
+TEST(JsonTest, PrintsNestedContainersOneElementPerLine) {
+  Json doc = Json::MakeObject()
+                 .Set("name", "a\"b\\c\n\x01")
+                 .Set("n", int64_t{-3})
+                 .Set("big", uint64_t{18446744073709551615u})
+                 .Set("none", Json())
+                 .Set("flag", false)
+                 .Set("empty", Json::MakeArray())
+                 .Set("list", Json::MakeArray().Append(1).Append(2))
+                 .Set("records", Json::MakeArray().Append(Json::MakeObject().Set("k", true)));
+  EXPECT_EQ(doc.Dump(),
+            "{\n"
+            "  \"name\": \"a\\\"b\\\\c\\n\\u0001\",\n"
+            "  \"n\": -3,\n"
+            "  \"big\": 18446744073709551615,\n"
+            "  \"none\": null,\n"
+            "  \"flag\": false,\n"
+            "  \"empty\": [],\n"
+            "  \"list\": [1, 2],\n"
+            "  \"records\": [\n"
+            "    {\"k\": true}\n"
+            "  ]\n"
+            "}\n");
+}
+
+TEST(JsonDeathTest, AddingToTheWrongKindOfValueIsFatal) {
+  EXPECT_DEATH(Json::MakeObject().Append(1),
+               "Check failed: std::holds_alternative<Array>\\(value_\\) Append on a JSON value "
+               "that is no array");
+  EXPECT_DEATH(Json::MakeArray().Set("k", 1),
+               "Check failed: std::holds_alternative<Object>\\(value_\\) Set on a JSON value "
+               "that is no object");
+}
+
+TEST(TextTableTest, AlignsColumnsWithoutTrailingBlanks) {
+  TextTable table({{"NAME"}, {"SIZE", TextTable::Align::kRight}, {"NOTE"}});
+  table.AddRow({"luma", "12000000", ""});
+  table.AddRow({"chroma", "6", "interleaved", "dropped"});
+  EXPECT_EQ(table.Render(),
+            "NAME        SIZE  NOTE\n"
+            "luma    12000000\n"
+            "chroma         6  interleaved\n");
+}
+
+TEST(ToolTest, TopLevelUsageAndUnknownCommand) {
+  RunResult none = RunOrvex({});
+  EXPECT_EQ(none.code, kExitError);
+  EXPECT_THAT(none.err, StartsWith("usage: orvex COMMAND"));
+
+  RunResult help = RunOrvex({"--help"});
+  EXPECT_EQ(help.code, kExitOk);
+  EXPECT_THAT(help.out, AllOf(HasSubstr("  formats "), HasSubstr("  layout ")));
+
+  RunResult unknown = RunOrvex({"frobnicate"});
+  EXPECT_EQ(unknown.code, kExitError);
+  EXPECT_THAT(unknown.err, StartsWith("orvex: unknown command 'frobnicate'\n"));
+}
+
+TEST(ToolTest, EveryCommandHasHelp) {
+  for (const Command* command :
+       {&DemoCommand(), &FormatsCommand(), &LayoutCommand(), &PyramidCommand(), &CpaCommand()}) {
+    const std::string name(command->spec.name);
+    SCOPED_TRACE(name);
+    RunResult result = RunOrvex({name, "--help"});
+    EXPECT_EQ(result.code, kExitOk);
+    EXPECT_THAT(result.out, StartsWith("usage: orvex " + name));
+    EXPECT_EQ(RunOrvex({"help", name}).out, result.out);
+    RunResult bad = RunOrvex({name, "--no-such-flag"});
+    EXPECT_EQ(bad.code, kExitError);
+    EXPECT_EQ(bad.err, "orvex " + name + ": unknown flag '--no-such-flag'\nRun 'orvex " + name +
+                           " --help' for usage.\n");
+  }
+}
+
+// The tool's format list must not drift from the library: scanning the code
+// ranges the library uses finds no named format missing from the list.
+TEST(FormatsTest, ListHoldsEveryNamedFormat) {
+  auto listed = AllHalPixelFormats();
+  EXPECT_EQ(listed.size(), 41u);
+  for (size_t i = 1; i < listed.size(); ++i) {
+    EXPECT_LT(static_cast<uint32_t>(listed[i - 1]), static_cast<uint32_t>(listed[i]));
+  }
+  std::vector<uint32_t> probes;
+  for (uint32_t code = 0; code < 0x400; ++code) probes.push_back(code);
+  for (uint32_t code = 0x40000000; code < 0x40000100; ++code) probes.push_back(code);
+  for (uint32_t base = 0; base < 0x400; ++base) {
+    for (uint32_t bits : {0x10000u, 0x50000u, 0x90000u, 0x110000u, 0x190000u, 0x150000u}) {
+      probes.push_back(base | bits);
+    }
+  }
+  for (uint32_t code : {0x20203859u, 0x20363159u, 0x32315659u}) probes.push_back(code);
+  for (uint32_t code : probes) {
+    const auto format = static_cast<orvex::HalPixelFormat>(static_cast<int32_t>(code));
+    if (orvex::FormatToString(format).rfind("UnknownFormat_", 0) == 0) continue;
+    EXPECT_NE(std::find(listed.begin(), listed.end(), format), listed.end())
+        << orvex::FormatToString(format);
+  }
+}
+
+TEST(FormatsTest, TableAndJson) {
+  RunResult table = RunOrvex({"formats"});
+  ASSERT_EQ(table.code, kExitOk);
+  EXPECT_EQ(std::count(table.out.begin(), table.out.end(), '\n'), 42);
+  EXPECT_THAT(table.out, StartsWith("       HEX     DECIMAL  NAME "));
+  // Columns line up: every name starts where the header's NAME does.
+  std::vector<std::string> lines;
+  std::istringstream stream(table.out);
+  for (std::string line; std::getline(stream, line);) lines.push_back(line);
+  const size_t name_column = lines[0].find("NAME");
+  for (const std::string& line : lines) {
+    EXPECT_NE(line[name_column], ' ') << line;
+    EXPECT_EQ(line[name_column - 1], ' ') << line;
+  }
+  EXPECT_THAT(Squeeze(table.out),
+              AllOf(HasSubstr("\n0x134 308 YCRCB_420_SP_M_SBWC 8 None yes same\n"),
+                    HasSubstr("\n0x4000000b 1073741835 YCBCR_420_SP_M_S10B_SBWC_STRIDE_ALIGNED_64 "
+                              "10 SBWC yes YCBCR_420_SP_M_S10B_STRIDE_ALIGNED_64\n"),
+                    HasSubstr("\n0x141 321 YCBCR_420_SP_M_SBWC_L75 8 Lossy SBWC Low Compression "
+                              "no YCBCR_420_888\n")));
+
+  RunResult json = RunOrvex({"formats", "--json"});
+  ASSERT_EQ(json.code, kExitOk);
+  EXPECT_THAT(json.out,
+              StartsWith("{\n  \"formats\": [\n    {\"name\": \"RGB_888\", \"code\": 3, "));
+  EXPECT_THAT(json.out,
+              HasSubstr("    {\"name\": \"YCBCR_420_SP_M_SBWC_L50\", \"code\": 320, \"hex\": "
+                        "\"0x140\", \"bits_per_sample\": 8, \"compression\": \"Lossy SBWC Medium "
+                        "Compression\", \"aligned_64\": false, \"uncompressed\": "
+                        "\"YCBCR_420_888\"},\n"));
+
+  EXPECT_EQ(RunOrvex({"formats", "extra"}).code, kExitError);
+}
+
+TEST(LayoutTest, JsonHasTheExactShape) {
+  RunResult result = RunOrvex({"layout", "64", "32", "yv12", "--json"});
+  ASSERT_EQ(result.code, kExitOk) << result.err;
+  EXPECT_EQ(result.out,
+            "{\n"
+            "  \"format\": \"YV12\",\n"
+            "  \"code\": 842094169,\n"
+            "  \"width\": 64,\n"
+            "  \"height\": 32,\n"
+            "  \"buffer_sizes\": [3072],\n"
+            "  \"components\": [\n"
+            "    {\"content\": \"Luma\", \"buffer_index\": 0, \"offset_bytes\": 0, \"width\": 64, "
+            "\"height\": 32, \"row_stride_bytes\": 64, \"bits_per_pixel\": 8, \"pixel_stride\": "
+            "1, \"pixel_phase\": 0},\n"
+            "    {\"content\": \"ChromaR\", \"buffer_index\": 0, \"offset_bytes\": 2048, "
+            "\"width\": 32, \"height\": 16, \"row_stride_bytes\": 32, \"bits_per_pixel\": 8, "
+            "\"pixel_stride\": 1, \"pixel_phase\": 0},\n"
+            "    {\"content\": \"ChromaB\", \"buffer_index\": 0, \"offset_bytes\": 2560, "
+            "\"width\": 32, \"height\": 16, \"row_stride_bytes\": 32, \"bits_per_pixel\": 8, "
+            "\"pixel_stride\": 1, \"pixel_phase\": 0}\n"
+            "  ],\n"
+            "  \"chroma_subsampling\": \"420\",\n"
+            "  \"interleaved_chroma_order\": null\n"
+            "}\n");
+  EXPECT_EQ(result.err, "");
+
+  // Substituted formats report the layout actually made; RAW has no chroma.
+  RunResult impl = RunOrvex({"layout", "64", "32", "34", "--json", "--order", "cbcr"});
+  ASSERT_EQ(impl.code, kExitOk) << impl.err;
+  EXPECT_THAT(impl.out, AllOf(HasSubstr("\"format\": \"YCBCR_420_888\",\n  \"code\": 35,\n"),
+                              HasSubstr("\"buffer_sizes\": [2048, 1024],\n"),
+                              HasSubstr("\"interleaved_chroma_order\": \"CbCr\"\n")));
+  RunResult raw = RunOrvex({"layout", "4000", "3000", "0x25", "--json"});
+  EXPECT_THAT(raw.out,
+              AllOf(HasSubstr("\"chroma_subsampling\": null,\n"),
+                    HasSubstr("\"content\": \"Bayer\""), HasSubstr("\"row_stride_bytes\": 5000")));
+}
+
+TEST(LayoutTest, TextShowsSizesAndComponents) {
+  RunResult result = RunOrvex({"layout", "1920", "1080", "YCBCR_P010"});
+  ASSERT_EQ(result.code, kExitOk);
+  EXPECT_EQ(result.out,
+            "YCBCR_P010 (0x36 = 54), 1920 x 1080\n"
+            "chroma subsampling: 420, interleaved chroma order: CbCr\n"
+            "buffer 0: 6220800 bytes\n"
+            "total: 6220800 bytes in 1 buffer\n"
+            "\n"
+            "CONTENT  BUFFER   OFFSET  WIDTH  HEIGHT  ROW STRIDE  BPP  PIXEL STRIDE  PHASE\n"
+            "Luma          0        0   1920    1080        3840   16             1      0\n"
+            "ChromaB       0  4147200    960     540        3840   16             2      0\n"
+            "ChromaR       0  4147200    960     540        3840   16             2      1\n");
+}
+
+TEST(LayoutTest, ConformanceVerdictAndExitStatus) {
+  RunResult yes =
+      RunOrvex({"layout", "1920", "1080", "YCBCR_420_888", "--conform", "YCBCR_420_888"});
+  EXPECT_EQ(yes.code, kExitOk);
+  EXPECT_THAT(yes.out, HasSubstr("\n\nconformance to YCBCR_420_888: conforms\n"));
+
+  RunResult no = RunOrvex({"layout", "4000", "3000", "RAW10", "--conform", "0x23"});
+  EXPECT_EQ(no.code, kExitNegative);
+  EXPECT_THAT(no.out, HasSubstr("conformance to YCBCR_420_888: INVALID_ARGUMENT: component bits "
+                                "per pixel: 10 != expected bits per pixel: 8; ImageFormat does "
+                                "not conform to YCBCR_420_888. \n"));
+
+  RunResult unchecked =
+      RunOrvex({"layout", "64", "64", "YCBCR_420_SP_M", "--conform", "YCBCR_420_SP_M"});
+  EXPECT_EQ(unchecked.code, kExitNegative);
+  EXPECT_THAT(unchecked.out, HasSubstr("UNIMPLEMENTED: Unable to check if conforms to "
+                                       "YCBCR_420_SP_M\n"));
+
+  // With --json stdout stays a pure JSON object.
+  RunResult json = RunOrvex({"layout", "2", "2", "Y10", "--json", "--conform", "Y10"});
+  EXPECT_EQ(json.code, kExitNegative);
+  EXPECT_THAT(json.out, AllOf(StartsWith("{\n"), testing::EndsWith("}\n")));
+  EXPECT_EQ(json.err,
+            "conformance to Y10: INVALID_ARGUMENT: ImageFormat does not conform to Y10. stride "
+            "must be multiple of 10\n");
+}
+
+TEST(LayoutTest, ErrorsGoToStderrWithExitTwo) {
+  ExpectErrors({
+      {{"layout", "30", "32", "YV12"},
+       "INVALID_ARGUMENT: image width should be a multiple of 4, 30 % 4 = 2; YV12 dimension "
+       "requirements not met\n"},
+      {{"layout", "64", "64", "RGB_888"},
+       "UNIMPLEMENTED: Unsupported HalPixelFormat: RGB_888, unable to make ImageFormat.\n"},
+      {{"layout", "64", "64", "0x1234"},
+       "UNIMPLEMENTED: Unsupported HalPixelFormat: UnknownFormat_0x1234, unable to make "
+       "ImageFormat.\n"},
+      {{"layout", "64", "64", "RAW10", "--order", "CbCr"},
+       "INVALID_ARGUMENT: Specifying interleaved pixel order for format: RAW10 is not "
+       "supported\n"},
+      {{"layout", "abc", "64", "RAW10"},
+       "orvex layout: WIDTH must be a whole number, got 'abc'\nRun 'orvex layout --help' for "
+       "usage.\n"},
+      {{"layout", "64", "-2", "RAW10"},
+       "orvex layout: HEIGHT must be between 1 and 2147483647, got -2\nRun 'orvex layout "
+       "--help' for usage.\n"},
+      {{"layout", "64", "64", "NOPE"},
+       "orvex layout: unknown FORMAT 'NOPE' (see 'orvex formats' for the names, or give a "
+       "code)\nRun 'orvex layout --help' for usage.\n"},
+      {{"layout", "64", "64", "RAW10", "--order", "RGB"},
+       "orvex layout: --order must be CbCr or CrCb, got 'RGB'\nRun 'orvex layout --help' for "
+       "usage.\n"},
+      {{"layout", "64", "64", "RAW10", "--conform", "x"},
+       "orvex layout: unknown --conform TARGET 'x' (see 'orvex formats' for the names, or give "
+       "a code)\nRun 'orvex layout --help' for usage.\n"},
+      {{"layout", "64", "64"},
+       "orvex layout: expected 3 arguments (WIDTH HEIGHT FORMAT), got 2\nRun 'orvex layout "
+       "--help' for usage.\n"},
+  });
+}
+
+TEST(LayoutTest, SvgDrawsEveryBufferAndComponent) {
+  ScratchDir dir;
+  const std::string path = dir.path() + "/layout.svg";
+  RunResult result = RunOrvex({"layout", "1920", "1080", "YCBCR_422_I", "--svg", path});
+  ASSERT_EQ(result.code, kExitOk) << result.err;
+  const std::string svg = ReadFile(path);
+  EXPECT_THAT(svg,
+              AllOf(StartsWith("<svg xmlns=\"http://www.w3.org/2000/svg\""),
+                    HasSubstr(">YCBCR_422_I 1920 x 1080: 1 buffer, 4147200 bytes</text>"),
+                    HasSubstr(">buffer 0: 4147200 bytes</text>"), testing::EndsWith("</svg>\n")));
+  // Luma, Cb and Cr share every byte of the interleaved buffer: three lanes,
+  // each the full bar length.
+  EXPECT_THAT(svg, HasSubstr("<rect x=\"20\" y=\"70\" width=\"720.00\" height=\"78\""));
+  for (const char* label : {"Luma", "ChromaB", "ChromaR"}) {
+    EXPECT_THAT(svg, HasSubstr(std::string(">") + label + "</text>")) << label;
+    EXPECT_THAT(svg, HasSubstr(std::string(">") + label + ": offset 0, 4147200 bytes")) << label;
+  }
+
+  // Two buffers drawn to one scale: the chroma bar is half the luma bar.
+  ASSERT_EQ(RunOrvex({"layout", "64", "32", "YCBCR_420_888", "--svg", path}).code, kExitOk);
+  const std::string two = ReadFile(path);
+  EXPECT_THAT(two, AllOf(HasSubstr("width=\"720.00\""), HasSubstr("width=\"360.00\""),
+                         HasSubstr(">buffer 1: 1024 bytes</text>")));
+
+  RunResult unwritable =
+      RunOrvex({"layout", "64", "32", "YV12", "--svg", dir.path() + "/no/x.svg"});
+  EXPECT_EQ(unwritable.code, kExitError);
+  EXPECT_EQ(unwritable.err, "INTERNAL: cannot write " + dir.path() + "/no/x.svg\n");
+  EXPECT_EQ(XmlEscape("a<b>&\"c"), "a&lt;b&gt;&amp;&quot;c");
+}
+
+}  // namespace
+}  // namespace orvex_tool
+
+namespace orvex_tool {
+namespace {
+
+TEST(PyramidTest, TextAndJson) {
+  const std::vector<std::string> args = {"pyramid",     "4000", "3000",  "--levels", "0:2",
+                                         "--alignment", "64",   "--bpp", "10"};
+  RunResult text = RunOrvex(args);
+  ASSERT_EQ(text.code, kExitOk) << text.err;
+  EXPECT_EQ(text.out,
+            "LEVEL  WIDTH  HEIGHT     BYTES\n"
+            "    0   4000    3000  15168000\n"
+            "    1   2000    1500   3840000\n"
+            "    2   1000     750    960000\n"
+            "total: 19968000 bytes\n");
+
+  std::vector<std::string> json_args = {"pyramid", "100",   "75", "--levels=1:2", "--alignment",
+                                        "64",      "--bpp", "8",  "--json"};
+  RunResult json = RunOrvex(json_args);
+  ASSERT_EQ(json.code, kExitOk) << json.err;
+  EXPECT_EQ(json.out,
+            "{\n"
+            "  \"levels\": [\n"
+            "    {\"level\": 1, \"width\": 50, \"height\": 38, \"bytes\": 2432},\n"
+            "    {\"level\": 2, \"width\": 25, \"height\": 19, \"bytes\": 1216}\n"
+            "  ],\n"
+            "  \"total_bytes\": 3648\n"
+            "}\n");
+}
+
+TEST(PyramidTest, Errors) {
+  const std::string hint = "\nRun 'orvex pyramid --help' for usage.\n";
+  ExpectErrors({
+      {{"pyramid", "64", "64", "--alignment", "64", "--bpp", "8"},
+       "orvex pyramid: --levels, --alignment and --bpp are required" + hint},
+      {{"pyramid", "64", "64", "--levels", "2:1", "--alignment", "64", "--bpp", "8"},
+       "orvex pyramid: --levels LOW must not exceed HIGH, got 2:1" + hint},
+      {{"pyramid", "64", "64", "--levels", "0:32", "--alignment", "64", "--bpp", "8"},
+       "orvex pyramid: HIGH must be between 0 and 31, got 32" + hint},
+      {{"pyramid", "64", "64", "--levels", "0:1", "--alignment", "x", "--bpp", "8"},
+       "orvex pyramid: --alignment must be a whole number, got 'x'" + hint},
+      {{"pyramid", "0", "64", "--levels", "0:1", "--alignment", "1", "--bpp", "8"},
+       "orvex pyramid: WIDTH must be between 1 and 2147483647, got 0" + hint},
+      {{"pyramid", "64", "64", "--levels", "0:1", "--alignment", "0", "--bpp", "8"},
+       "INVALID_ARGUMENT: alignment must be >= 1, received: 0\n"},
+      {{"pyramid", "64", "64", "--levels", "0:1", "--alignment", "1", "--bpp", "-8"},
+       "INVALID_ARGUMENT: bits per pixel must be >= 0, received: -8\n"},
+      // Sizes beyond 32 bits are refused, never wrapped.
+      {{"pyramid", "65536", "65536", "--levels", "1:2", "--alignment", "64", "--bpp", "13"},
+       "INVALID_ARGUMENT: total buffer size of levels [1, 2] for a 65536x65536 image does not "
+       "fit in 32 bits\n"},
+      {{"pyramid", "2147483647", "2", "--levels", "0:0", "--alignment", "2147483647", "--bpp",
+        "16"},
+       "INVALID_ARGUMENT: buffer size of level 0 for a 2147483647x2 image does not fit in 32 "
+       "bits\n"},
+  });
+}
+
+void WriteFile(const std::string& path, const std::string& bytes) {
+  std::ofstream out(path, std::ios::binary | std::ios::trunc);
+  out << bytes;
+}
+
+orvex::CameraPerformanceDataFile SampleCpa() {
+  orvex::CameraPerformanceDataFile file;
+  orvex::CameraLatencyData* open = file.add_camera_latency_data();
+  open->set_operation_case("Camera-Open");
+  orvex::CameraLatencyDataType* overall = open->add_latency_data();
+  overall->set_event_name("Overall");
+  overall->set_duration_ms(212.5f);
+  orvex::CameraLatencyDataType* sensor = open->add_latency_data();
+  sensor->set_event_name("SensorPowerUp");
+  sensor->set_duration_ms(48.0625f);
+  file.add_camera_latency_data()->set_operation_case("Camera-Close");
+  orvex::CameraPerformanceData* camera = file.add_camera_data();
+  camera->set_camera_id(1);
+  camera->add_per_frame_data()->set_frame_number(7);
+  camera->add_per_frame_data()->set_frame_number(8);
+  file.mutable_graph_representation()->set_graph_name("preview");
+  file.mutable_graph_representation()->add_nodes()->set_node_name("isp");
+  return file;
+}
+
+TEST(CpaTest, SummaryOfAFullFile) {
+  ScratchDir dir;
+  const std::string path = dir.path() + "/sample.cpa";
+  WriteFile(path, SampleCpa().SerializeAsString());
+  RunResult result = RunOrvex({"cpa", path});
+  ASSERT_EQ(result.code, kExitOk) << result.err;
+  EXPECT_EQ(result.out,
+            "OPERATION     EVENT          DURATION (ms)\n"
+            "Camera-Open   Overall              212.500\n"
+            "Camera-Open   SensorPowerUp         48.062\n"
+            "Camera-Close  -                          -\n"
+            "latency data: 2 operations, 2 events\n"
+            "camera data: 1 camera, 2 frames\n"
+            "graph representation: 'preview', 1 nodes, 0 edges\n");
+}
+
+TEST(CpaTest, EmptyFileIsValid) {
+  ScratchDir dir;
+  const std::string path = dir.path() + "/empty.cpa";
+  WriteFile(path, "");
+  RunResult result = RunOrvex({"cpa", path});
+  EXPECT_EQ(result.code, kExitOk);
+  EXPECT_EQ(result.out,
+            "latency data: none\ncamera data: 0 cameras, 0 frames\ngraph representation: none\n");
+  RunResult json = RunOrvex({"cpa", path, "--json"});
+  EXPECT_EQ(json.code, kExitOk);
+  EXPECT_EQ(json.out, "{}\n");
+}
+
+TEST(CpaTest, JsonIsTheProtocolBuffersPrinting) {
+  ScratchDir dir;
+  const std::string path = dir.path() + "/sample.cpa";
+  WriteFile(path, SampleCpa().SerializeAsString());
+  RunResult result = RunOrvex({"cpa", "--json", path});
+  ASSERT_EQ(result.code, kExitOk) << result.err;
+  // The printing parses back to the same message.
+  orvex::CameraPerformanceDataFile parsed;
+  ASSERT_TRUE(google::protobuf::util::JsonStringToMessage(result.out, &parsed).ok());
+  EXPECT_EQ(parsed.SerializeAsString(), SampleCpa().SerializeAsString());
+  EXPECT_THAT(result.out, AllOf(HasSubstr("\"operationCase\": \"Camera-Open\""),
+                                HasSubstr("\"durationMs\": 212.5"), testing::EndsWith("}\n")));
+}
+
+TEST(CpaTest, UnreadableAndCorruptFilesAreErrors) {
+  ScratchDir dir;
+  const std::string missing = dir.path() + "/missing.cpa";
+  RunResult absent = RunOrvex({"cpa", missing});
+  EXPECT_EQ(absent.code, kExitError);
+  EXPECT_EQ(absent.err, "NOT_FOUND: cannot open " + missing + ": No such file or directory\n");
+
+  RunResult directory = RunOrvex({"cpa", dir.path()});
+  EXPECT_EQ(directory.code, kExitError);
+  EXPECT_EQ(directory.err, "FAILED_PRECONDITION: cannot read " + dir.path() + ": Is a directory\n");
+
+  struct Case {
+    std::string name;
+    std::string bytes;
+  };
+  std::string truncated = SampleCpa().SerializeAsString();
+  truncated.resize(truncated.size() - 3);
+  const Case cases[] = {
+      {"truncated", truncated},
+      {"bad wire type", std::string("\x0f", 1)},
+      {"unterminated varint", std::string("\x08\xff\xff", 3)},
+      {"text", "this is not a profile\n"},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.name);
+    const std::string path = dir.path() + "/corrupt.cpa";
+    WriteFile(path, c.bytes);
+    for (bool json : {false, true}) {
+      RunResult result = json ? RunOrvex({"cpa", path, "--json"}) : RunOrvex({"cpa", path});
+      EXPECT_EQ(result.code, kExitError);
+      EXPECT_EQ(result.out, "");
+      EXPECT_EQ(result.err, "INVALID_ARGUMENT: " + path +
+                                " is not a valid .cpa file: it does not parse as a "
+                                "CameraPerformanceDataFile message (" +
+                                std::to_string(c.bytes.size()) + " bytes)\n");
+    }
+  }
+}
+
+}  // namespace
+}  // namespace orvex_tool
+
+namespace orvex_tool {
+namespace {
+
+TEST(DemoTest, PercentileIsNearestRank) {
+  std::vector<absl::Duration> values;
+  for (int i = 100; i >= 1; --i) values.push_back(absl::Milliseconds(i));
+  EXPECT_EQ(Percentile({}, 0.5), absl::ZeroDuration());
+  EXPECT_EQ(Percentile({absl::Seconds(3)}, 0.99), absl::Seconds(3));
+  EXPECT_EQ(Percentile(values, 0.5), absl::Milliseconds(50));
+  EXPECT_EQ(Percentile(values, 0.99), absl::Milliseconds(99));
+  EXPECT_EQ(Percentile(values, 1.0), absl::Milliseconds(100));
+}
+
+TEST(DemoTest, EveryPlaneOfEveryLayoutFamilyIsVerified) {
+  ScratchDir dir;
+  struct Case {
+    orvex::HalPixelFormat format;
+    int planes;  // distinct runs of bytes written and checked per frame
+  };
+  const Case cases[] = {
+      {orvex::HalPixelFormat::YCBCR_420_888, 2},  // luma + interleaved chroma
+      {orvex::HalPixelFormat::YCBCR_P010, 2},     // one buffer, two planes
+      {orvex::HalPixelFormat::YV12, 3},
+      {orvex::HalPixelFormat::YCBCR_422_I, 1},
+      {orvex::HalPixelFormat::RAW10, 1},
+      {orvex::HalPixelFormat::BLOB, 1},
+      {orvex::HalPixelFormat::YCBCR_420_SP_M_SBWC, 4},  // headers and payloads
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(orvex::FormatToString(c.format));
+    DemoOptions options;
+    options.size = {64, 32};
+    options.format = c.format;
+    options.frames = 5;
+    options.out_dir = dir.path();
+    auto report = RunDemo(options);
+    ASSERT_THAT(report.status(), IsOk());
+    EXPECT_EQ(report->frames_processed, 5);
+    EXPECT_EQ(report->frames_verified, 5);
+    EXPECT_EQ(report->planes_checked, 5 * c.planes);
+    EXPECT_THAT(report->failures, ElementsAre());
+    EXPECT_EQ(report->wake_latencies.size(), 5u);
+    EXPECT_THAT(report->cpa_path, StartsWith(dir.path() + "/camera-ended-"));
+  }
+}
+
+TEST(DemoTest, CorruptedFrameFailsVerification) {
+  ScratchDir dir;
+  DemoOptions options;
+  options.size = {64, 32};
+  options.format = orvex::HalPixelFormat::YV12;
+  options.frames = 4;
+  options.out_dir = dir.path();
+  options.corrupt_frame = 2;
+  auto report = RunDemo(options);
+  ASSERT_THAT(report.status(), IsOk());
+  EXPECT_EQ(report->frames_processed, 4);
+  EXPECT_EQ(report->frames_verified, 3);
+  EXPECT_THAT(report->failures,
+              ElementsAre("frame 2: plane 2 (ChromaB, buffer 0, offset 2560, 512 bytes) checksum "
+                          "mismatch"));
+}
+
+TEST(DemoTest, CommandReportsAndWritesAReadableProfile) {
+  ScratchDir dir;
+  const std::string out = dir.path() + "/nested/out";
+  RunResult result =
+      RunOrvex({"demo", "--size", "64x32", "--frames", "3", "--format", "yv12", "--out", out});
+  ASSERT_EQ(result.code, kExitOk) << result.err;
+  EXPECT_EQ(result.err, "");
+  EXPECT_THAT(result.out,
+              testing::MatchesRegex(
+                  "orvex demo: 3 frames of YV12 64x32 \\(1 buffer, 3072 bytes per frame\\)\n"
+                  "frames processed: 3\n"
+                  "verification: passed \\(3 of 3 frames, 9 plane checksums\\)\n"
+                  "throughput: [0-9.]+ frames/s, [0-9.]+ MB/s \\([0-9.]+ s in all\\)\n"
+                  "signal-to-wake latency: median [0-9.]+ ms, p99 [0-9.]+ ms\n"
+                  "latency profile: (.*/camera-ended-[0-9_-]+\\.cpa)\n"
+                  "  read it back with: orvex cpa .*\\.cpa\n"));
+  const std::string marker = "latency profile: ";
+  const size_t at = result.out.find(marker) + marker.size();
+  const std::string cpa = result.out.substr(at, result.out.find('\n', at) - at);
+  EXPECT_THAT(cpa, StartsWith(out + "/camera-ended-"));
+
+  RunResult read = RunOrvex({"cpa", cpa});
+  ASSERT_EQ(read.code, kExitOk) << read.err;
+  EXPECT_THAT(read.out, AllOf(testing::ContainsRegex("\nDemo-Open +Overall +[0-9.]+\n"),
+                              testing::ContainsRegex("\nDemo-Process +WakeLatencyP99 +[0-9.]+\n"),
+                              testing::ContainsRegex("\nDemo-Close +Overall +[0-9.]+\n"),
+                              HasSubstr("latency data: 3 operations, 9 events\n")));
+}
+
+TEST(DemoTest, TraceRecordsFramesAndFenceWaits) {
+  ScratchDir dir;
+  const std::string trace = dir.path() + "/trace.json";
+  RunResult result =
+      RunOrvex({"demo", "--size", "64x32", "--frames", "2", "--out", dir.path(), "--trace", trace});
+  ASSERT_EQ(result.code, kExitOk) << result.err;
+  EXPECT_THAT(result.out, HasSubstr("trace: " + trace + " (open it in the Perfetto UI"));
+  const std::string json = ReadFile(trace);
+  EXPECT_THAT(json, AllOf(StartsWith("["), HasSubstr("\"orvex demo: produce frame\""),
+                          HasSubstr("\"orvex demo: consume frame\""),
+                          HasSubstr("\"orvex demo: frames verified\"")));
+}
+
+TEST(DemoTest, Errors) {
+  ScratchDir dir;
+  const std::string file = dir.path() + "/plain-file";
+  WriteFile(file, "x");
+  const std::string hint = "\nRun 'orvex demo --help' for usage.\n";
+  ExpectErrors({
+      {{"demo", "--size", "64"}, "orvex demo: --size must look like WIDTHxHEIGHT, got '64'" + hint},
+      {{"demo", "--frames", "0"},
+       "orvex demo: --frames must be between 1 and 100000, got 0" + hint},
+      {{"demo", "--format", "nope"},
+       "orvex demo: unknown --format 'nope' (see 'orvex formats' for the names, or give a code)" +
+           hint},
+      {{"demo", "--out="}, "orvex demo: --out must name a directory" + hint},
+      {{"demo", "extra"}, "orvex demo: unexpected argument 'extra'" + hint},
+      {{"demo", "--format", "RGB_888", "--out", dir.path()},
+       "UNIMPLEMENTED: Unsupported HalPixelFormat: RGB_888, unable to make ImageFormat.\n"},
+      {{"demo", "--size", "63x32", "--out", dir.path()},
+       "INVALID_ARGUMENT: image width should be a multiple of 2, 63 % 2 = 1; YCBCR_420_888 "
+       "dimension requirements not met\n"},
+      {{"demo", "--size", "30000x30000", "--out", dir.path()},
+       "RESOURCE_EXHAUSTED: a 30000x30000 YCBCR_420_888 frame takes 1350000000 bytes; the demo "
+       "allows at most 1073741824 per frame\n"},
+      {{"demo", "--size", "64x32", "--frames", "1", "--out", file + "/sub"},
+       "INTERNAL: the latency analyzer wrote no .cpa file into " + file +
+           "/sub (see its [CPA] log line)\n"},
+      {{"demo", "--size", "64x32", "--trace", dir.path() + "/no/trace.json"},
+       "NOT_FOUND: cannot trace into " + dir.path() +
+           "/no/trace.json: No such file or directory\n"},
+  });
+}
+
+}  // namespace
+}  // namespace orvex_tool
