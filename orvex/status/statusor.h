@@ -212,13 +212,17 @@ class [[nodiscard]] StatusOr {
 
   // GCC cannot follow the ok() guard around copies out of the union and
   // reports the value as maybe uninitialized; the guard makes it safe.
+#if defined(__GNUC__) && !defined(__clang__)
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wmaybe-uninitialized"
+#endif
   template <typename... Args>
   void Construct(Args&&... args) {
     ::new (static_cast<void*>(&value_)) T(std::forward<Args>(args)...);
   }
+#if defined(__GNUC__) && !defined(__clang__)
 #pragma GCC diagnostic pop
+#endif
   template <typename U>
   void Assign(U&& value) {
     if (ok()) {

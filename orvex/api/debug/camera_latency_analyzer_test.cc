@@ -29,7 +29,6 @@ using ::orvex::testing::IsOk;
 using ::orvex::testing::StatusIs;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
-using ::testing::StartsWith;
 using Events = std::list<std::pair<std::string, float>>;
 
 void SetProperty(const char* key, const char* value) { ASSERT_EQ(property_set(key, value), 0); }

@@ -98,7 +98,7 @@ TEST(HeapAllocatorTest, CountsLiveBytesAcrossThreads) {
 }
 
 TEST(HeapAllocatorDeathTest, DefaultKindMustBeConcrete) {
-  EXPECT_DEATH(HeapAllocator(FenceType::kDefault),
+  EXPECT_DEATH((void)HeapAllocator(FenceType::kDefault),
                "Check failed: default_fence_type != FenceType::kDefault "
                "\\(default_fence_type=0, FenceType::kDefault=0\\) HeapAllocator needs a concrete "
                "default fence type");

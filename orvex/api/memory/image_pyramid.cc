@@ -56,7 +56,7 @@ StatusOr<std::unique_ptr<ImagePyramid>> ImagePyramid::MakeFromSpans(orvex_api::R
     ORVEX_RETURN_IF_ERROR(
         image_pyramid_utils::CheckedGetTotalBufferSize(size, levels, alignment, bits_per_pixel)
             .status());
-    spans.reserve(static_cast<size_t>(levels.upper - levels.lower + 1));
+    spans.reserve(static_cast<size_t>(levels.upper) - static_cast<size_t>(levels.lower) + 1);
   }
   uint64_t offset = 0;
   uint64_t total = 0;

@@ -88,7 +88,10 @@ void SoftwareFence::Signal(Status status) {
   if (!listeners.empty()) {
     {
       fence_internal::ListenerScope scope(this);
-      for (FenceListener& listener : listeners) fence_internal::CallListener(listener, status);
+      // `status` was reassigned from status_ when listeners were taken.
+      for (FenceListener& listener : listeners) {
+        fence_internal::CallListener(listener, status);  // NOLINT(bugprone-use-after-move)
+      }
     }
     std::lock_guard<std::mutex> lock(mutex_);
     --listeners_running_;

@@ -57,7 +57,9 @@ Status MergedFence::AddListener(FenceListener listener) {
       stored = true;
     }
   }
-  if (!stored) fence_internal::CallListener(listener, GetFenceStatus());
+  // Moved from only when stored.
+  if (!stored)
+    fence_internal::CallListener(listener, GetFenceStatus());  // NOLINT(bugprone-use-after-move)
   return OkStatus();
 }
 

@@ -45,7 +45,7 @@ class RefusingFence : public Fence {
 };
 
 TEST(MergedFenceTest, EmptyAndNullEntriesCountAsDone) {
-  for (std::vector<Fence*> fences : {std::vector<Fence*>{}, std::vector<Fence*>{nullptr}}) {
+  for (const std::vector<Fence*>& fences : {std::vector<Fence*>{}, std::vector<Fence*>{nullptr}}) {
     SCOPED_TRACE(fences.size());
     auto merged = MergeFences(fences);
     EXPECT_TRUE(std::get<Status>(merged->WaitForDone(absl::ZeroDuration())).ok());

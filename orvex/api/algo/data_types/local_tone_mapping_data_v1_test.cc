@@ -149,7 +149,7 @@ TEST(LocalToneMappingTest, StridedLayoutsGiveTheSameCurve) {
   std::vector<float> values(16 * 12 * 8 * 2);
   for (size_t i = 0; i < values.size(); ++i) values[i] = (i % 2 == 0) ? slope(rng) : bias(rng);
   auto value = [&](int x, int y, int z, int c) {
-    return values[static_cast<size_t>((((z * 12) + y) * 16 + x) * 2 + c)];
+    return values[((((static_cast<size_t>(z) * 12) + y) * 16 + x) * 2 + c)];
   };
   auto packed = MakeData();
   FillGrid(*packed, value);

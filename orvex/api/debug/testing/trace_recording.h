@@ -56,7 +56,7 @@ class TraceRecording {
         if (key == "value") rest += " =" + text;
         if (key == "tid") tid = " @" + text;
       }
-      if (ph != "M") events.push_back(ph + name + rest + tid);
+      if (ph != "M") events.push_back(std::string(ph).append(name).append(rest).append(tid));
     }
     return events;
   }
