@@ -6,11 +6,14 @@ function(orvex_target_warnings target)
   target_compile_options(${target} PRIVATE
     -Wall -Wextra -Wpedantic -Wshadow -Wnon-virtual-dtor -Wcast-align
     -Woverloaded-virtual -Wnull-dereference -Wformat=2 -Wimplicit-fallthrough
-    -Wmisleading-indentation -Wduplicated-cond -Wlogical-op)
+    -Wmisleading-indentation)
+  if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU")
+    target_compile_options(${target} PRIVATE -Wduplicated-cond -Wlogical-op)
+  endif()
   if(ORVEX_WERROR)
     target_compile_options(${target} PRIVATE -Werror)
   endif()
-  if(NOT ORVEX_SANITIZE STREQUAL "")
+  if(NOT ORVEX_SANITIZE STREQUAL "" AND CMAKE_CXX_COMPILER_ID STREQUAL "GNU")
     # Sanitizer instrumentation makes GCC's flow analysis report false
     # "may be used uninitialized" warnings in union-based value types.
     target_compile_options(${target} PRIVATE -Wno-maybe-uninitialized)
@@ -24,11 +27,20 @@ macro(orvex_configure_sanitizers)
     add_compile_options(-fsanitize=address,undefined -fno-sanitize-recover=all
                         -fno-omit-frame-pointer)
     add_link_options(-fsanitize=address,undefined -fno-sanitize-recover=all)
+  elseif(ORVEX_SANITIZE STREQUAL "fuzzer")
+    # libFuzzer (clang only): coverage instrumentation without libFuzzer's
+    # main() for every object; the fuzz targets link -fsanitize=fuzzer.
+    if(NOT CMAKE_CXX_COMPILER_ID STREQUAL "Clang")
+      message(FATAL_ERROR "ORVEX_SANITIZE=fuzzer needs clang")
+    endif()
+    add_compile_options(-fsanitize=fuzzer-no-link,address,undefined
+                        -fno-sanitize-recover=all -fno-omit-frame-pointer)
+    add_link_options(-fsanitize=address,undefined -fno-sanitize-recover=all)
   elseif(ORVEX_SANITIZE STREQUAL "thread")
     add_compile_options(-fsanitize=thread -fno-omit-frame-pointer)
     add_link_options(-fsanitize=thread)
   elseif(NOT ORVEX_SANITIZE STREQUAL "")
-    message(FATAL_ERROR "ORVEX_SANITIZE must be empty, 'address' or 'thread'")
+    message(FATAL_ERROR "ORVEX_SANITIZE must be empty, 'address', 'thread' or 'fuzzer'")
   endif()
 endmacro()
 

@@ -574,9 +574,11 @@ StatusOr<ImageFormat> ImageFormat::Make(
            << " is not supported";
   }
   if (*family == Family::kSemiPlanar420) {
-    const bool cr_first = order == Order::kCrCb;
-    components[1].pixel_phase = cr_first ? 1 : 0;  // kChromaB
-    components[2].pixel_phase = cr_first ? 0 : 1;  // kChromaR
+    // An order value that is no enumerator counts as kCrCb, as it does for
+    // its text and for the conformance check.
+    const bool cb_first = order == Order::kCbCr;
+    components[1].pixel_phase = cb_first ? 0 : 1;  // kChromaB
+    components[2].pixel_phase = cb_first ? 1 : 0;  // kChromaR
   }
 
   std::vector<size_t> buffer_sizes(d.buffer_sizes.begin(), d.buffer_sizes.begin() + d.buffer_count);

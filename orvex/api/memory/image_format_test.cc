@@ -113,6 +113,19 @@ TEST(ImageFormatTest, SemiPlanar420Layouts) {
   }
 }
 
+// Found by fuzzing: an order value that is no enumerator was laid out Cb
+// first while its text and the conformance check read it as CrCb, so the
+// made format did not conform to its own format.
+TEST(ImageFormatTest, OrderThatIsNoEnumeratorIsLaidOutAsCrCb) {
+  const auto odd = static_cast<Order>(7);
+  const StatusOr<ImageFormat> made = ImageFormat::Make(64, 2, F::YCBCR_P010, odd);
+  ASSERT_TRUE(made.ok()) << made.status();
+  EXPECT_EQ(made->components()[1].pixel_phase, 1);  // kChromaB
+  EXPECT_EQ(made->components()[2].pixel_phase, 0);  // kChromaR
+  EXPECT_TRUE(made->ConformsTo(F::YCBCR_P010).ok());
+  EXPECT_THAT(made->DebugStrVerbose(), ::testing::EndsWith("InterleavedChromaOrder: CrCb}"));
+}
+
 TEST(ImageFormatTest, PlanarAndInterleavedLayouts) {
   // clang-format off
   const std::vector<LayoutCase> cases = {
