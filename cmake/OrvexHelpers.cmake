@@ -28,10 +28,11 @@ macro(orvex_configure_sanitizers)
                         -fno-omit-frame-pointer)
     add_link_options(-fsanitize=address,undefined -fno-sanitize-recover=all)
   elseif(ORVEX_SANITIZE STREQUAL "fuzzer")
-    # libFuzzer (clang only): coverage instrumentation without libFuzzer's
-    # main() for every object; the fuzz targets link -fsanitize=fuzzer.
+    # Set by ORVEX_BUILD_FUZZERS (clang only): ASan, UBSan and libFuzzer's
+    # coverage instrumentation without its main(); the fuzz targets link
+    # -fsanitize=fuzzer.
     if(NOT CMAKE_CXX_COMPILER_ID STREQUAL "Clang")
-      message(FATAL_ERROR "ORVEX_SANITIZE=fuzzer needs clang")
+      message(FATAL_ERROR "ORVEX_BUILD_FUZZERS needs clang (the fuzz preset sets it)")
     endif()
     add_compile_options(-fsanitize=fuzzer-no-link,address,undefined
                         -fno-sanitize-recover=all -fno-omit-frame-pointer)
@@ -40,7 +41,7 @@ macro(orvex_configure_sanitizers)
     add_compile_options(-fsanitize=thread -fno-omit-frame-pointer)
     add_link_options(-fsanitize=thread)
   elseif(NOT ORVEX_SANITIZE STREQUAL "")
-    message(FATAL_ERROR "ORVEX_SANITIZE must be empty, 'address', 'thread' or 'fuzzer'")
+    message(FATAL_ERROR "ORVEX_SANITIZE must be empty, 'address' or 'thread'")
   endif()
 endmacro()
 

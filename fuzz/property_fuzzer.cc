@@ -4,7 +4,8 @@
 // - Get returns what Set stored (the system proxy: or refuses the write);
 // - GetAs<int> agrees with strtoll in base 0 on the trimmed text, or with
 //   base 2 after a leading "0b"; a parsed int and float read back the same
-//   from their printed form; GetAs<bool> accepts exactly the ten words;
+//   from their printed form; GetAs<float> agrees with strtof on plain
+//   decimal texts; GetAs<bool> accepts exactly the ten words;
 // - a refused value fails with INVALID_ARGUMENT and the exact message.
 
 #include <fuzzer/FuzzedDataProvider.h>
@@ -82,8 +83,26 @@ void CheckInt(SystemProperties& props, const std::string& value) {
   ORVEX_CHECK(again.ok() && *again == *parsed) << "'" << value << "'";
 }
 
+// strtof over all of a plain decimal or scientific text (trimmed); out of
+// range values read as infinity or zero as the contract says.
+std::optional<float> ReferenceFloat(std::string_view text) {
+  const std::string trimmed(Trim(text));
+  if (trimmed.empty() || trimmed.find_first_not_of("0123456789.eE+-") != std::string::npos) {
+    return std::nullopt;
+  }
+  char* end = nullptr;
+  const float value = std::strtof(trimmed.c_str(), &end);
+  if (end != trimmed.c_str() + trimmed.size()) return std::nullopt;
+  return value;
+}
+
 void CheckFloat(SystemProperties& props, const std::string& value) {
   const StatusOr<float> parsed = props.GetAs<float>(kKey);
+  if (const std::optional<float> expected = ReferenceFloat(value); expected.has_value()) {
+    ORVEX_CHECK(parsed.ok()) << "'" << value << "': " << parsed.status();
+    ORVEX_CHECK(*parsed == *expected)
+        << "'" << value << "' read " << *parsed << ", strtof " << *expected;
+  }
   if (!parsed.ok()) {
     CheckRefused(parsed.status(), value, "float");
     return;
