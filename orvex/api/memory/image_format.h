@@ -81,7 +81,9 @@ class ORVEX_EXPORT ImageFormat : public Printable {
 
   // Lays out a width x height image of `format`. IMPLEMENTATION_DEFINED and
   // IMPLEMENTATION_DEFINED_64 are laid out (and recorded) as YCBCR_420_888
-  // and YCBCR_420_888_STRIDE_ALIGNED_64. Errors:
+  // and YCBCR_420_888_STRIDE_ALIGNED_64. An order value that is no
+  // enumerator is recorded as given and laid out, printed and checked as
+  // kCrCb. Errors:
   //   UNIMPLEMENTED     format without a layout (RGB_888, unknown codes), or
   //                     a YCBCR_422_I order other than kCrCb;
   //   INVALID_ARGUMENT  dimensions that are not multiples the format needs,
