@@ -356,11 +356,5 @@ TEST(AlgorithmRecordsTest, CdafConfigText) {
   EXPECT_THAT(c.DebugStr(), ::testing::EndsWith("start_y: 20\n  Windows config: "));
 }
 
-TEST(AlgorithmRecordsTest, PlainResultDefaults) {
-  const BinaryClassificationResult result;
-  EXPECT_EQ(result.label, 0);
-  EXPECT_EQ(result.confidence, 0.0f);
-}
-
 }  // namespace
 }  // namespace orvex_api
