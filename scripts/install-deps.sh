@@ -12,11 +12,13 @@ packages=(
   libhwy-dev
 )
 # Extra package groups, chosen with arguments: "asan"/"tsan" need nothing
-# beyond g++; "clang" adds the compiler and runtime for fuzzing.
+# beyond g++; "clang" adds the compiler and runtime for fuzzing; "coverage"
+# adds the coverage report generator.
 for group in "$@"; do
   case "$group" in
     clang) packages+=(clang libclang-rt-14-dev) ;;
     tidy) packages+=(clang-tidy clang-format) ;;
+    coverage) packages+=(gcovr) ;;
     *) ;;
   esac
 done

@@ -3,9 +3,7 @@
 #include <cstdint>
 #include <string>
 #include <string_view>
-#include <vector>
 
-#include "absl/strings/str_split.h"
 #include "gtest/gtest.h"
 
 namespace orvex_api {
@@ -16,18 +14,16 @@ E As(int64_t v) {
   return static_cast<E>(v);
 }
 
-// Checks that value first + i prints the i-th of the '|'-separated names,
-// and that the values just outside the table print empty.
+// A name table of `count` entries from value `first`: its two ends print
+// their names, and the values just outside it (and the extremes) print empty.
 template <typename E, typename F>
-void ExpectTable(F to_string, const char* joined, int first = 0) {
-  const std::vector<std::string> names = absl::StrSplit(joined, '|');
-  for (size_t i = 0; i < names.size(); ++i) {
-    SCOPED_TRACE(names[i]);
-    EXPECT_EQ(to_string(As<E>(first + static_cast<int>(i))), names[i]);
-  }
-  const int64_t outside[] = {first - 1, first + static_cast<int64_t>(names.size()), INT32_MIN,
-                             INT32_MAX};
-  for (int64_t v : outside) {
+void ExpectTable(F to_string, int count, const char* first_name, const char* last_name,
+                 int first = 0) {
+  SCOPED_TRACE(first_name);
+  EXPECT_EQ(to_string(As<E>(first)), first_name);
+  EXPECT_EQ(to_string(As<E>(first + count - 1)), last_name);
+  for (int64_t v :
+       {int64_t{first} - 1, int64_t{first} + count, int64_t{INT32_MIN}, int64_t{INT32_MAX}}) {
     SCOPED_TRACE(v);
     EXPECT_EQ(to_string(As<E>(v)), "");
   }
@@ -56,31 +52,19 @@ TEST(CameraApiTypesTest, SingleComparisonNames) {
   for (const auto& c : cases) EXPECT_EQ(c.got, c.want);
 }
 
-// Every table name once; the lookups are bounds-checked, and the sanitizer
-// build catches any read past a table.
-TEST(CameraApiTypesTest, TableNames) {
+// The lookups are bounds-checked; the sanitizer build catches any read past
+// a table.
+TEST(CameraApiTypesTest, TableEnds) {
   auto to_string = [](auto v) { return ToString(v); };
-  ExpectTable<PixelFormat>(
-      to_string,
-      "Raw10|Raw12|Raw16|YCBCR_420_888|YCBCR_420_888_64|YCBCR_420_Custom|YCBCR_420_Custom_64|"
-      "YCBCR_420_10B|Jpeg|Hardware_Dependent_YUV|Hardware_Dependent_YUV_64|YCBCR_P010|"
-      "YCBCR_P010_M|YCBCR_P010_M_64|YCBCR_420_888_SBWC|YCRCB_420_888_SBWC|"
-      "YCBCR_420_888_SBWC_L50|YCBCR_420_888_SBWC_L75|YCBCR_420_SP_M_S10B_SBWC|"
-      "YCBCR_420_SP_M_S10B_SBWC_L40|YCBCR_420_SP_M_S10B_SBWC_L60|YCBCR_420_SP_M_S10B_SBWC_L80");
-  ExpectTable<Rotation>(to_string, "CCW_0|CCW_90|CCW_180|CCW_270");
-  ExpectTable<RequestTemplate>(
-      to_string, "Preview|Capture|Video|Video snapshot|Zero shutter lag|Manual", /*first=*/1);
-  ExpectTable<TorchModeStatus>(to_string, "Not available|Available off|Available on");
-  ExpectTable<CustomDataSpace>(
-      to_string, "Unknown|Arbitrary|Depth|Sensor|Dynamic depth|JPEG APP segments|HEIF|Unspecified");
+  ExpectTable<PixelFormat>(to_string, 22, "Raw10", "YCBCR_420_SP_M_S10B_SBWC_L80");
+  ExpectTable<Rotation>(to_string, 4, "CCW_0", "CCW_270");
+  ExpectTable<RequestTemplate>(to_string, 6, "Preview", "Manual", /*first=*/1);
+  ExpectTable<TorchModeStatus>(to_string, 3, "Not available", "Available on");
+  ExpectTable<CustomDataSpace>(to_string, 8, "Unknown", "Unspecified");
   auto color = [](auto v) { return ColorSpace::ToString(v); };
-  ExpectTable<ColorSpace::Standard>(
-      color,
-      "Unspecified|BT709|BT601_625|BT601_625_Unadjusted|BT601_525|BT601_525_Unadjusted|BT2020|"
-      "BT2020_Constant_Luminance|BT470M|Film|DCI_P3|Adobe_RGB");
-  ExpectTable<ColorSpace::Transfer>(
-      color, "Unspecified|Linear|RGB|SMPTE_170M|Gamma2.2|Gamma2.6|Gamma2.8|ST2084|HLG");
-  ExpectTable<ColorSpace::Range>(color, "Unspecified|Full|Limited|Extended");
+  ExpectTable<ColorSpace::Standard>(color, 12, "Unspecified", "Adobe_RGB");
+  ExpectTable<ColorSpace::Transfer>(color, 9, "Unspecified", "HLG");
+  ExpectTable<ColorSpace::Range>(color, 4, "Unspecified", "Extended");
 }
 
 TEST(CameraApiTypesTest, IsRawFormat) {

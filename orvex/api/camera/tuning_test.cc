@@ -1,7 +1,6 @@
 #include "orvex/api/camera/tuning.h"
 
 #include <memory>
-#include <type_traits>
 #include <vector>
 
 #include "gmock/gmock.h"
@@ -75,45 +74,6 @@ TEST(TuningPointOpaqueMetadataTest, OwnsThePointUntilDestroyed) {
             17);
   metadata.reset();  // Through the base's virtual destructor.
   EXPECT_TRUE(weak.expired());
-}
-
-// Fakes override exactly the declared number of pure operations: one
-// missing leaves the class abstract, one extra does not compile.
-struct FakeBlock : LscTuningBlock {
-  uint32_t GetBlockId() const override { return 3; }
-  GenericSize<int> GetGridSize() const override { return {17, 13}; }
-  std::span<const float> GetGainTable(int) const override { return {}; }
-};
-
-struct FakeBundle : TuningBundle {
-  std::shared_ptr<const TuningBlock> FindBlock(uint32_t) const override { return nullptr; }
-  size_t GetBlockCount() const override { return 1; }
-};
-
-struct FakeMetadataBundle : TuningMetadataBundle {
-  std::shared_ptr<TuningInputMetadata> GetInputMetadata() const override { return nullptr; }
-  std::shared_ptr<TuningOutputMetadata> GetOutputMetadata() const override { return nullptr; }
-  std::shared_ptr<TuningPointMetadata> GetPointMetadata() const override { return nullptr; }
-  std::shared_ptr<OpaqueMetadata> GetOpaqueMetadata() const override { return nullptr; }
-  void SetInputMetadata(std::shared_ptr<TuningInputMetadata>) override {}
-  void SetOutputMetadata(std::shared_ptr<TuningOutputMetadata>) override {}
-  void SetPointMetadata(std::shared_ptr<TuningPointMetadata>) override {}
-  void SetOpaqueMetadata(std::shared_ptr<OpaqueMetadata>) override {}
-  void Clear() override {}
-};
-
-TEST(TuningInterfacesTest, SlotCounts) {
-  static_assert(std::is_abstract_v<TuningBlock> && std::is_abstract_v<LscTuningBlock> &&
-                std::is_abstract_v<TuningBundle> && std::is_abstract_v<TuningMetadataBundle> &&
-                std::is_abstract_v<TuningPoint>);
-  static_assert(!std::is_abstract_v<TuningBase> && !std::is_abstract_v<OpaqueMetadata> &&
-                !std::is_abstract_v<TuningMetadata> && !std::is_abstract_v<TuningPointMetadata> &&
-                !std::is_abstract_v<TuningInputMetadata> &&
-                !std::is_abstract_v<TuningOutputMetadata>);
-  static_assert(std::has_virtual_destructor_v<TuningBase> &&
-                std::has_virtual_destructor_v<TuningMetadata>);
-  static_assert(!std::is_abstract_v<FakeBlock> && !std::is_abstract_v<FakeBundle> &&
-                !std::is_abstract_v<FakeMetadataBundle>);
 }
 
 }  // namespace

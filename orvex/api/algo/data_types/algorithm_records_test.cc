@@ -35,8 +35,7 @@ TEST(AlgorithmRecordsTest, EnumerationTexts) {
       {ToString(static_cast<PdafSoftwareFeatureFlag>(1)), ""},
       {ToString(static_cast<PdafSoftwareFeatureFlag>(2)), "dynamic downsample"},
       {ToString(static_cast<PdafSoftwareFeatureFlag>(4)), ", hot pixel suppression"},
-      {ToString(static_cast<PdafSoftwareFeatureFlag>(6)),
-       "dynamic downsample, hot pixel suppression"},
+      {Text(static_cast<PdafSoftwareFeatureFlag>(6)), "dynamic downsample, hot pixel suppression"},
       {ToString(static_cast<PdafSoftwareFeatureFlag>(0xFFF9)), ""},
       {Text(CsiDataType::kRaw10), "raw_10"},
       {Text(PdafAutoFocusMode::kVideoRecording), "video recording"},
@@ -354,12 +353,6 @@ TEST(AlgorithmRecordsTest, CdafConfigText) {
   // Without windows the section ends after its heading.
   c.windows.clear();
   EXPECT_THAT(c.DebugStr(), ::testing::EndsWith("start_y: 20\n  Windows config: "));
-}
-
-TEST(AlgorithmRecordsTest, PlainResultDefaults) {
-  const BinaryClassificationResult result;
-  EXPECT_EQ(result.label, 0);
-  EXPECT_EQ(result.confidence, 0.0f);
 }
 
 }  // namespace

@@ -225,11 +225,17 @@ TEST(LocalToneMappingTest, InvalidInputsWriteNothing) {
       {"zero entries", [](auto&) {}, 0, "Gain table size must be at least 1, got 0"},
       {"zero width", [](auto& d) { d.grid->desc.width = 0; }, 8,
        "Empty grid: width 0, height 12, depth 8"},
+      {"zero height", [](auto& d) { d.grid->desc.height = 0; }, 8,
+       "Empty grid: width 16, height 0, depth 8"},
+      {"negative depth", [](auto& d) { d.grid->desc.depth = -1; }, 8,
+       "Empty grid: width 16, height 12, depth -1"},
       {"empty curve", [](auto& d) { d.guide_curve->desc.num_entries = 0; }, 8,
        "Empty guide curve: 0 entries"},
       {"stride past storage", [](auto& d) { d.grid->desc.stride_z = 385; }, 8,
        "Grid strides address elements outside the grid buffer"},
       {"negative stride", [](auto& d) { d.grid->desc.stride_x = -2; }, 8,
+       "Grid strides address elements outside the grid buffer"},
+      {"negative channel stride", [](auto& d) { d.grid->desc.stride_channel = -1; }, 8,
        "Grid strides address elements outside the grid buffer"},
   };
   for (const auto& c : cases) {
