@@ -139,6 +139,13 @@ StatusOr<std::unique_ptr<Buffer::MappedHandle>> HwBuffer::MapImpl(int64_t offset
       const int fd = GetFd();
       if (fd < 0) return InternalErrorBuilder(ORVEX_LOC) << "Invalid FD: " << fd;
       StatusOr<void*> mapped = mapper_->MapFileDescriptor(fd, GetSize(), 0, mode);
+      // A mapper that answers success without an address has mapped
+      // nothing usable: report it instead of handing out a null pointer
+      // (and mapping again, unrecorded, at every later call).
+      if (mapped.ok() && *mapped == nullptr) {
+        mapped = Status(InternalErrorBuilder(ORVEX_LOC)
+                        << "Mapping of FD: " << fd << " gave no address");
+      }
       if (!mapped.ok()) {
         return StatusBuilder(mapped.status(), ORVEX_LOC) << "Error mapping: " << DebugStr();
       }
