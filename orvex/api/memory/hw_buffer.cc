@@ -178,7 +178,12 @@ void HwBuffer::UnmapMode(int mode_index) const {
   std::lock_guard<std::mutex> lock(mapping_mutex_);
   void*& base = base_addresses_[mode_index];
   if (base == nullptr) return;
-  mapper_->Unmap(base, GetSize());
+  // Nobody is left to receive an error here (the buffer is being destroyed),
+  // so a failure is logged rather than lost.
+  if (const int result = mapper_->Unmap(base, GetSize()); result != 0) {
+    ORVEX_LOG(ERROR) << "Unmapping of FD: " << fd_ << " failed with code: " << result
+                     << " errno: " << ErrnoText(errno);
+  }
   base = nullptr;
 }
 

@@ -81,7 +81,8 @@ class ORVEX_EXPORT HwBuffer final : public Buffer {
                                                   std::unique_ptr<Fence> fence);
 
   HwBuffer(Sigil, int fd, uint64_t size, BufferAttributes attributes, std::unique_ptr<Fence> fence);
-  // Runs the clean-ups, which remove the mappings (most recent first).
+  // Runs the clean-ups, which remove the mappings (most recent first); a
+  // mapper that fails to unmap is logged at ERROR ("Unmapping of FD: ...").
   ~HwBuffer() override;
 
   int GetFd() const override;

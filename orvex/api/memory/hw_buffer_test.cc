@@ -160,11 +160,21 @@ class RecordingMapper : public MmapWrapper {
     return address;
   }
   int Unmap(void* address, uint64_t size) const override {
+    int failure = 0;
     {
       std::lock_guard<std::mutex> lock(mutex_);
       events_.push_back(fmt::format("unmap {} {}", modes_[address], size));
+      std::swap(failure, unmap_errno_);
     }
-    return MmapWrapper::Unmap(address, size);
+    const int result = MmapWrapper::Unmap(address, size);
+    if (failure == 0) return result;
+    errno = failure;
+    return -1;
+  }
+  // The next Unmap reports failure with `err` (after unmapping for real).
+  void FailNextUnmap(int err) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    unmap_errno_ = err;
   }
   std::vector<std::string> events() const {
     std::lock_guard<std::mutex> lock(mutex_);
@@ -178,6 +188,7 @@ class RecordingMapper : public MmapWrapper {
  private:
   mutable std::mutex mutex_;
   mutable std::deque<StatusOr<void*>> script_;
+  mutable int unmap_errno_ = 0;
   mutable std::vector<std::string> events_;
   mutable std::map<void*, std::string_view> modes_;
 };
@@ -354,7 +365,15 @@ TEST_F(HwBufferTest, FailedMappingsLeaveNoStateBehind) {
     ASSERT_THAT(handle, IsOk());
     EXPECT_NE((*handle)->data(), nullptr);
   }
+  // A failed unmapping at destruction has no caller to go to: it is logged.
+  mapper_->FailNextUnmap(EINVAL);
+  ::testing::internal::CaptureStderr();
   buffer.reset();
+  EXPECT_EQ(errno, EINVAL) << "the log line keeps the failure's errno";
+  EXPECT_THAT(::testing::internal::GetCapturedStderr(),
+              HasSubstr(fmt::format("] Unmapping of FD: {} failed with code: -1 errno: Invalid "
+                                    "argument\n",
+                                    fd_.get())));
   const std::vector<std::string> events = mapper_->events();
   EXPECT_THAT(std::vector<std::string>(events.end() - 4, events.end()),
               ElementsAre("map Read", "map ReadWrite", "unmap ReadWrite 4096", "unmap Read 4096"));
