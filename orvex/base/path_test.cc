@@ -229,6 +229,11 @@ TEST_F(PathDirTest, OverlongPathFailsWithoutSideEffects) {
                        ::testing::AllOf(::testing::StartsWith("Error creating directory " + root_),
                                         ::testing::EndsWith(": File name too long"))));
   EXPECT_FALSE(IsDir(root_ + "/d"));
+  // One component longer than any file system takes.
+  EXPECT_THAT(RecursivelyCreateDir(root_ + "/d/" + std::string(NAME_MAX + 1, 'n') + "/e"),
+              StatusIs(StatusCode::kInvalidArgument, ::testing::EndsWith(": File name too long")));
+  EXPECT_FALSE(IsDir(root_ + "/d"));
+  EXPECT_THAT(RecursivelyCreateDir(root_ + "/d/" + std::string(NAME_MAX, 'n')), IsOk());
   // Just under the limit the kernel decides: deep nesting works.
   path = root_;
   const std::string component = "/" + std::string(60, 'd');
