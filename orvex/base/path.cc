@@ -28,6 +28,18 @@ Status CreateOneDir(const std::string& path) {
   return status;
 }
 
+// True when a component of `path` is longer than any file system takes.
+bool HasOverlongComponent(std::string_view path) {
+  size_t start = 0;
+  while (start < path.size()) {
+    size_t end = path.find('/', start);
+    if (end == std::string_view::npos) end = path.size();
+    if (end - start > NAME_MAX) return true;
+    start = end + 1;
+  }
+  return false;
+}
+
 bool IsTrivialDir(std::string_view clean) { return clean.empty() || clean == "." || clean == "/"; }
 
 }  // namespace
@@ -106,11 +118,12 @@ std::string CleanPath(std::string_view path) {
 // Equivalent to: create the directory; if that fails, create its parent the
 // same way, then try the directory once more. The walk up is a loop rather
 // than recursion so that no input can exhaust the stack. A path the kernel
-// can never accept fails before any of its parents is made.
+// can never accept (too long, or with a component longer than NAME_MAX)
+// fails before any of its parents is made.
 Status RecursivelyCreateDir(std::string_view path) {
   if (path.empty()) return OkStatus();
   std::string current = CleanPath(path);
-  if (current.size() >= PATH_MAX) {
+  if (current.size() >= PATH_MAX || HasOverlongComponent(current)) {
     return StatusFromErrno(ENAMETOOLONG, "Error creating directory " + current);
   }
   std::vector<std::string> pending;  // directories to retry, innermost first

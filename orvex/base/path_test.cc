@@ -13,6 +13,7 @@
 
 #include "gmock/gmock.h"
 #include "gtest/gtest.h"
+#include "orvex/base/testing/scratch_mount.h"
 #include "orvex/status/status_matchers.h"
 
 namespace orvex {
@@ -164,15 +165,60 @@ TEST_F(PathDirTest, CreatesMissingParents) {
   EXPECT_TRUE(IsDir(root_ + "/a/b/d"));
 }
 
-TEST_F(PathDirTest, FileInTheWay) {
+TEST_F(PathDirTest, SomethingElseInTheWay) {
   const std::string file = root_ + "/file";
   std::ofstream(file) << "x";
-  EXPECT_THAT(
-      RecursivelyCreateDir(file),
-      StatusIs(StatusCode::kAlreadyExists, "Error creating directory " + file + ": File exists"));
-  EXPECT_THAT(
-      RecursivelyCreateDir(file + "/sub/dir"),
-      StatusIs(StatusCode::kAlreadyExists, "Error creating directory " + file + ": File exists"));
+  ASSERT_EQ(symlink("missing", (root_ + "/dangling").c_str()), 0);
+  ASSERT_EQ(symlink("loop", (root_ + "/loop").c_str()), 0);
+  ASSERT_EQ(mkdir((root_ + "/dir").c_str(), 0777), 0);
+  ASSERT_EQ(symlink("dir", (root_ + "/to_dir").c_str()), 0);
+  struct Case {
+    std::string path;
+    std::string refused;  // the path in the error; empty: accepted
+  };
+  const std::vector<Case> cases = {
+      {file, file},
+      {file + "/sub/dir", file},
+      {root_ + "/dangling", root_ + "/dangling"},
+      {root_ + "/dangling/sub", root_ + "/dangling"},
+      {root_ + "/loop/sub", root_ + "/loop"},
+      {root_ + "/to_dir/sub", ""},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.path);
+    if (c.refused.empty()) {
+      EXPECT_THAT(RecursivelyCreateDir(c.path), IsOk());
+      EXPECT_TRUE(IsDir(c.path));
+    } else {
+      EXPECT_THAT(RecursivelyCreateDir(c.path),
+                  StatusIs(StatusCode::kAlreadyExists,
+                           "Error creating directory " + c.refused + ": File exists"));
+    }
+  }
+  EXPECT_FALSE(IsDir(root_ + "/missing"));
+}
+
+// Runs in a child process with a tmpfs of its own on root_: a read-only file
+// system refuses new directories, while existing ones still count as made.
+TEST_F(PathDirTest, ReadOnlyFileSystem) {
+  if (!testing::ScratchMountsAvailable(root_)) {
+    GTEST_SKIP() << "no private tmpfs mounts here: read-only file systems not exercised";
+  }
+  EXPECT_EXIT(
+      {
+        if (!testing::MountScratchTmpfs(root_, "size=16k") ||
+            mkdir((root_ + "/kept").c_str(), 0777) != 0 || !testing::RemountReadOnly(root_)) {
+          _exit(2);
+        }
+        const Status existing = RecursivelyCreateDir(root_ + "/kept/");
+        const Status fresh = RecursivelyCreateDir(root_ + "/kept/new/dir");
+        fprintf(stderr, "existing: %s\nfresh: %s\n", existing.ToString().c_str(),
+                fresh.ToString().c_str());
+        _exit(existing.ok() && !IsDir(root_ + "/kept/new") ? 0 : 1);
+      },
+      ::testing::ExitedWithCode(0),
+      "existing: OK\nfresh: PERMISSION_DENIED: Error creating directory .*/kept/new: Read-only "
+      "file system\n");
 }
 
 TEST_F(PathDirTest, OverlongPathFailsWithoutSideEffects) {
@@ -183,6 +229,11 @@ TEST_F(PathDirTest, OverlongPathFailsWithoutSideEffects) {
                        ::testing::AllOf(::testing::StartsWith("Error creating directory " + root_),
                                         ::testing::EndsWith(": File name too long"))));
   EXPECT_FALSE(IsDir(root_ + "/d"));
+  // One component longer than any file system takes.
+  EXPECT_THAT(RecursivelyCreateDir(root_ + "/d/" + std::string(NAME_MAX + 1, 'n') + "/e"),
+              StatusIs(StatusCode::kInvalidArgument, ::testing::EndsWith(": File name too long")));
+  EXPECT_FALSE(IsDir(root_ + "/d"));
+  EXPECT_THAT(RecursivelyCreateDir(root_ + "/d/" + std::string(NAME_MAX, 'n')), IsOk());
   // Just under the limit the kernel decides: deep nesting works.
   path = root_;
   const std::string component = "/" + std::string(60, 'd');

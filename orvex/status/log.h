@@ -53,6 +53,15 @@ class ErrnoSaver {
   int saved_;
 };
 
+// The platform's severity test. A platform may change errno while it decides
+// (it can read its configuration on the way), so the caller's value is kept
+// here too: a line that is not written leaves errno alone, and the text of a
+// line that is written sees the caller's errno.
+inline bool ShouldLog(android::base::LogSeverity severity) {
+  ErrnoSaver errno_saver;
+  return android::base::ShouldLog(severity, nullptr);
+}
+
 // One log line. The ErrnoSaver is declared first so that it is destroyed
 // last, after the platform message has been written.
 class LogLine {
@@ -145,7 +154,7 @@ ORVEX_INTERNAL_DEFINE_CHECK_OP(GE, >=)
 #define ORVEX_LOG(severity) ORVEX_INTERNAL_LOG_##severity
 
 #define ORVEX_INTERNAL_LOG_AT(severity)                                                            \
-  !::android::base::ShouldLog(::android::base::severity, nullptr)                                  \
+  !::orvex::log_internal::ShouldLog(::android::base::severity)                                     \
       ? (void)0                                                                                    \
       : ::orvex::log_internal::Voidify() &                                                         \
             ::orvex::log_internal::LogLine(ORVEX_SOURCE_UNIT, __LINE__, ::android::base::severity) \

@@ -1,6 +1,8 @@
 #include "android-base/logging.h"
 
 #include <errno.h>
+#include <pthread.h>
+#include <signal.h>
 #include <string.h>
 #include <sys/syscall.h>
 #include <unistd.h>
@@ -66,6 +68,40 @@ std::string ErrnoText(int error) {
   return text != nullptr ? text : "";
 }
 
+// Writes `line` to stderr; a line that cannot be written is lost. A reader
+// that has gone away must not end the process: SIGPIPE is blocked for the
+// write, and one the write raised is taken back unless one was pending
+// already.
+void WriteLine(const std::string& line) {
+  sigset_t pipe_signal;
+  sigemptyset(&pipe_signal);
+  sigaddset(&pipe_signal, SIGPIPE);
+  sigset_t pending;
+  const bool was_pending = sigpending(&pending) == 0 && sigismember(&pending, SIGPIPE) == 1;
+  sigset_t old_mask;
+  const bool blocked = pthread_sigmask(SIG_BLOCK, &pipe_signal, &old_mask) == 0;
+  bool broken_pipe = false;
+  const char* p = line.data();
+  size_t left = line.size();
+  while (left > 0) {
+    const ssize_t n = write(STDERR_FILENO, p, left);
+    if (n < 0 && errno == EINTR) continue;
+    if (n <= 0) {
+      broken_pipe = n < 0 && errno == EPIPE;
+      break;
+    }
+    p += n;
+    left -= static_cast<size_t>(n);
+  }
+  if (!blocked) return;
+  if (broken_pipe && !was_pending) {
+    const struct timespec no_wait = {0, 0};
+    while (sigtimedwait(&pipe_signal, nullptr, &no_wait) < 0 && errno == EINTR) {
+    }
+  }
+  pthread_sigmask(SIG_SETMASK, &old_mask, nullptr);
+}
+
 }  // namespace
 
 bool ShouldLog(LogSeverity severity, const char* /*tag*/) {
@@ -103,17 +139,7 @@ LogMessage::~LogMessage() {
     line += ErrnoText(error_);
   }
   line += '\n';
-  if (severity_ >= FATAL || severity_ >= MinSeverity()) {
-    const char* p = line.data();
-    size_t left = line.size();
-    while (left > 0) {
-      ssize_t n = write(STDERR_FILENO, p, left);
-      if (n < 0 && errno == EINTR) continue;
-      if (n <= 0) break;  // A line that cannot be written is lost.
-      p += n;
-      left -= static_cast<size_t>(n);
-    }
-  }
+  if (severity_ >= FATAL || severity_ >= MinSeverity()) WriteLine(line);
   if (severity_ == FATAL) std::abort();
   errno = saved_errno_;
 }

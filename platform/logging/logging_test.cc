@@ -1,7 +1,9 @@
 #include "android-base/logging.h"
 
 #include <errno.h>
+#include <signal.h>
 #include <stdlib.h>
+#include <unistd.h>
 
 #include "gmock/gmock.h"
 #include "gtest/gtest.h"
@@ -50,6 +52,40 @@ TEST(HostLoggingDeathTest, ThresholdFromEnvironmentAndFatalAborts) {
   EXPECT_DEATH(android::base::LogMessage("f", 3, android::base::FATAL, nullptr, -1).stream()
                    << "the end",
                "F .* f:3\\] the end");
+}
+
+// A line that cannot be written is lost, and nothing else happens: no
+// signal ends the process, errno is kept, and a signal of the same kind that
+// was already pending stays pending.
+TEST(HostLoggingDeathTest, UnwritableStderrLosesTheLineOnly) {
+  EXPECT_EXIT(
+      {
+        int fds[2];
+        if (pipe(fds) != 0 || dup2(fds[1], STDERR_FILENO) < 0) _exit(2);
+        close(fds[0]);  // nobody reads: writing raises SIGPIPE by default
+        errno = EDOM;
+        android::base::LogMessage("u", 1, android::base::ERROR, nullptr, -1).stream() << "lost";
+        const bool kept = errno == EDOM;
+        sigset_t blocked;
+        sigemptyset(&blocked);
+        sigaddset(&blocked, SIGPIPE);
+        sigprocmask(SIG_BLOCK, &blocked, nullptr);
+        raise(SIGPIPE);
+        android::base::LogMessage("u", 2, android::base::ERROR, nullptr, -1).stream() << "lost";
+        sigset_t pending;
+        sigpending(&pending);
+        _exit(kept && sigismember(&pending, SIGPIPE) == 1 ? 0 : 1);
+      },
+      ::testing::ExitedWithCode(0), "");
+  // Closed outright.
+  EXPECT_EXIT(
+      {
+        close(STDERR_FILENO);
+        errno = EDOM;
+        android::base::LogMessage("u", 3, android::base::WARNING, nullptr, -1).stream() << "lost";
+        _exit(errno == EDOM ? 0 : 1);
+      },
+      ::testing::ExitedWithCode(0), "");
 }
 
 }  // namespace

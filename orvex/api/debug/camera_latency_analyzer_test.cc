@@ -19,6 +19,7 @@
 #include "gtest/gtest.h"
 #include "orvex/api/sysprop/system_properties.h"
 #include "orvex/base/path.h"
+#include "orvex/base/testing/scratch_mount.h"
 #include "orvex/status/status_matchers.h"
 
 namespace orvex {
@@ -367,6 +368,53 @@ TEST_F(LatencyAnalyzerDeathTest, FailedWriteIsAnErrorAndLeavesNoFile) {
       },
       ::testing::ExitedWithCode(0),
       "status: [A-Z_]+: Failed to write file: .*/camera-ended-.*\\.cpa: File too large");
+}
+
+// Runs in a child process with a 16 KiB tmpfs of its own on the scratch root.
+TEST_F(LatencyAnalyzerDeathTest, FullAndReadOnlyDisks) {
+  if (!testing::ScratchMountsAvailable(root_)) {
+    GTEST_SKIP() << "no private tmpfs mounts here: full and read-only disks not exercised";
+  }
+  analyzer_.InjectEvent("Camera-Open", {{"Overall", 5}, {"Sensor", 2}});
+  const auto report = [](const char* what, const Status& status) {
+    fprintf(stderr, "%s: %s\n", what, status.ToString().c_str());
+  };
+  EXPECT_EXIT(
+      {
+        if (!testing::MountScratchTmpfs(root_, "size=16k") || !RecursivelyCreateDir(out_).ok()) {
+          _exit(2);
+        }
+        // An earlier session's file, and ballast until the disk is full.
+        const std::string earlier = out_ + "/camera-ended-" + TimeText(time(nullptr)) + ".cpa";
+        std::ofstream(earlier) << "earlier session";
+        {
+          std::ofstream ballast(out_ + "/ballast");
+          const std::string page(4096, 'b');
+          for (int i = 0; i < 8 && ballast; ++i) ballast << page << std::flush;
+        }
+        report("full", analyzer_.WriteProtoToDisk("camera-ended"));
+        const std::vector<std::string> after_full = Files();
+        const bool kept = ReadFile(earlier) == "earlier session";
+
+        // Space freed: the records are still there to write.
+        fs::remove(out_ + "/ballast");
+        report("freed", analyzer_.WriteProtoToDisk("camera-ended"));
+        const size_t written = Files().size();
+
+        // Read-only: no file in the directory, no directory below it.
+        if (!testing::RemountReadOnly(root_)) _exit(3);
+        report("read-only", analyzer_.WriteProtoToDisk("camera-ended"));
+        analyzer_.SetOutputDirectory(out_ + "/sub");
+        report("read-only below", analyzer_.WriteProtoToDisk("camera-ended"));
+        _exit(after_full.size() == 2 && kept && written == 2 ? 0 : 1);
+      },
+      ::testing::ExitedWithCode(0),
+      "full: RESOURCE_EXHAUSTED: Failed to write file: .*/camera-ended-[0-9_-]+\\.cpa: No space "
+      "left on device\n"
+      "(.*\n)?freed: OK\n"
+      "read-only: INTERNAL: Failed to open file: .*/camera-ended-[0-9_-]+\\.cpa\n"
+      "read-only below: PERMISSION_DENIED: Error creating directory .*/profiler/sub: Read-only "
+      "file system\n");
 }
 
 // The environment is read when the analyzer is first used, so this runs in

@@ -139,6 +139,13 @@ StatusOr<std::unique_ptr<Buffer::MappedHandle>> HwBuffer::MapImpl(int64_t offset
       const int fd = GetFd();
       if (fd < 0) return InternalErrorBuilder(ORVEX_LOC) << "Invalid FD: " << fd;
       StatusOr<void*> mapped = mapper_->MapFileDescriptor(fd, GetSize(), 0, mode);
+      // A mapper that answers success without an address has mapped
+      // nothing usable: report it instead of handing out a null pointer
+      // (and mapping again, unrecorded, at every later call).
+      if (mapped.ok() && *mapped == nullptr) {
+        mapped = Status(InternalErrorBuilder(ORVEX_LOC)
+                        << "Mapping of FD: " << fd << " gave no address");
+      }
       if (!mapped.ok()) {
         return StatusBuilder(mapped.status(), ORVEX_LOC) << "Error mapping: " << DebugStr();
       }
@@ -171,7 +178,12 @@ void HwBuffer::UnmapMode(int mode_index) const {
   std::lock_guard<std::mutex> lock(mapping_mutex_);
   void*& base = base_addresses_[mode_index];
   if (base == nullptr) return;
-  mapper_->Unmap(base, GetSize());
+  // Nobody is left to receive an error here (the buffer is being destroyed),
+  // so a failure is logged rather than lost.
+  if (const int result = mapper_->Unmap(base, GetSize()); result != 0) {
+    ORVEX_LOG(ERROR) << "Unmapping of FD: " << fd_ << " failed with code: " << result
+                     << " errno: " << ErrnoText(errno);
+  }
   base = nullptr;
 }
 

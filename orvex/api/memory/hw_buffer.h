@@ -81,7 +81,8 @@ class ORVEX_EXPORT HwBuffer final : public Buffer {
                                                   std::unique_ptr<Fence> fence);
 
   HwBuffer(Sigil, int fd, uint64_t size, BufferAttributes attributes, std::unique_ptr<Fence> fence);
-  // Runs the clean-ups, which remove the mappings (most recent first).
+  // Runs the clean-ups, which remove the mappings (most recent first); a
+  // mapper that fails to unmap is logged at ERROR ("Unmapping of FD: ...").
   ~HwBuffer() override;
 
   int GetFd() const override;
@@ -104,7 +105,8 @@ class ORVEX_EXPORT HwBuffer final : public Buffer {
 
   // The body of both Map overloads. Checks the range (Buffer::CheckMapRange),
   // maps the whole descriptor in `mode` on first use (INTERNAL "Invalid FD:
-  // <fd>" for a negative descriptor; a mapper failure annotated with "Error
+  // <fd>" for a negative descriptor; a mapper failure, or INTERNAL "Mapping
+  // of FD: <fd> gave no address" for a null address, annotated with "Error
   // mapping: " and DebugStr()), starts the CPU access of a cached buffer,
   // and returns a handle at base + offset.
   StatusOr<std::unique_ptr<MappedHandle>> MapImpl(int64_t offset, uint64_t size,

@@ -139,31 +139,56 @@ ScopedFd MakeMemfd(uint64_t size) {
   return ScopedFd(fd);
 }
 
-// MmapWrapper that records "map <mode>" and "unmap <mode of that address>".
+// MmapWrapper that records "map <mode>" and "unmap <mode of that address>",
+// and answers mappings from a script of results while one is left.
 class RecordingMapper : public MmapWrapper {
  public:
   StatusOr<void*> MapFileDescriptor(int fd, uint64_t size, int64_t offset,
                                     BufferAccessMode mode) const override {
-    StatusOr<void*> address = MmapWrapper::MapFileDescriptor(fd, size, offset, mode);
-    std::lock_guard<std::mutex> lock(mutex_);
+    std::unique_lock<std::mutex> lock(mutex_);
+    StatusOr<void*> address = UnknownError("");
+    if (!script_.empty()) {
+      address = std::move(script_.front());
+      script_.pop_front();
+    } else {
+      lock.unlock();
+      address = MmapWrapper::MapFileDescriptor(fd, size, offset, mode);
+      lock.lock();
+    }
     events_.push_back(fmt::format("map {}", AccessModeToString(mode)));
     if (address.ok()) modes_[*address] = AccessModeToString(mode);
     return address;
   }
   int Unmap(void* address, uint64_t size) const override {
+    int failure = 0;
     {
       std::lock_guard<std::mutex> lock(mutex_);
       events_.push_back(fmt::format("unmap {} {}", modes_[address], size));
+      std::swap(failure, unmap_errno_);
     }
-    return MmapWrapper::Unmap(address, size);
+    const int result = MmapWrapper::Unmap(address, size);
+    if (failure == 0) return result;
+    errno = failure;
+    return -1;
+  }
+  // The next Unmap reports failure with `err` (after unmapping for real).
+  void FailNextUnmap(int err) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    unmap_errno_ = err;
   }
   std::vector<std::string> events() const {
     std::lock_guard<std::mutex> lock(mutex_);
     return events_;
   }
+  void Script(std::deque<StatusOr<void*>> results) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    script_ = std::move(results);
+  }
 
  private:
   mutable std::mutex mutex_;
+  mutable std::deque<StatusOr<void*>> script_;
+  mutable int unmap_errno_ = 0;
   mutable std::vector<std::string> events_;
   mutable std::map<void*, std::string_view> modes_;
 };
@@ -303,6 +328,64 @@ TEST_F(HwBufferTest, MappingFailures) {
   EXPECT_THAT(mapper_->events(),
               ElementsAre("map Read", "map Write", "map Read", "unmap Read 4096"));
   EXPECT_THAT(TakeSyncCalls(), ElementsAre(SyncCall{read_only.get(), DMA_BUF_SYNC_READ}));
+}
+
+// A mapper failure of any kind leaves the mode unmapped, with nothing
+// registered or synchronised, and the next mapping in that mode works.
+TEST_F(HwBufferTest, FailedMappingsLeaveNoStateBehind) {
+  auto buffer = MakeBuffer(fd_.get());
+  const std::string annotation = "; Error mapping: " + buffer->DebugStr();
+  struct Case {
+    StatusOr<void*> mapper_result;
+    StatusCode code;
+    std::string message;
+  };
+  const std::vector<Case> cases = {
+      {ResourceExhaustedError("no address space"), StatusCode::kResourceExhausted,
+       "no address space" + annotation},
+      {PermissionDeniedError(""), StatusCode::kPermissionDenied,
+       "Error mapping: " + buffer->DebugStr()},
+      {static_cast<void*>(nullptr), StatusCode::kInternal,
+       fmt::format("Mapping of FD: {} gave no address", fd_.get()) + annotation},
+  };
+  for (const Case& c : cases) {
+    for (auto mode : {BufferAccessMode::kRead, BufferAccessMode::kReadWrite}) {
+      SCOPED_TRACE(::testing::Message() << c.message << " " << AccessModeToString(mode));
+      mapper_->Script({c.mapper_result});
+      EXPECT_THAT(buffer->Map(0, kSize, mode), StatusIs(c.code, c.message));
+      EXPECT_THAT(TakeSyncCalls(), IsEmpty());
+    }
+  }
+  std::weak_ptr<HwBuffer> weak = buffer;
+  EXPECT_EQ(weak.use_count(), 1) << "a failed mapping keeps a share of the buffer";
+
+  // The next attempt maps for real, once per mode, and is undone once.
+  for (auto mode : {BufferAccessMode::kRead, BufferAccessMode::kReadWrite}) {
+    auto handle = buffer->Map(8, 8, mode);
+    ASSERT_THAT(handle, IsOk());
+    EXPECT_NE((*handle)->data(), nullptr);
+  }
+  // A failed unmapping at destruction has no caller to go to: it is logged.
+  mapper_->FailNextUnmap(EINVAL);
+  ::testing::internal::CaptureStderr();
+  buffer.reset();
+  EXPECT_EQ(errno, EINVAL) << "the log line keeps the failure's errno";
+  EXPECT_THAT(::testing::internal::GetCapturedStderr(),
+              HasSubstr(fmt::format("] Unmapping of FD: {} failed with code: -1 errno: Invalid "
+                                    "argument\n",
+                                    fd_.get())));
+  const std::vector<std::string> events = mapper_->events();
+  EXPECT_THAT(std::vector<std::string>(events.end() - 4, events.end()),
+              ElementsAre("map Read", "map ReadWrite", "unmap ReadWrite 4096", "unmap Read 4096"));
+  EXPECT_EQ(events.size(), 10u);
+
+  // mmap itself refusing a mapping the address space cannot hold.
+  auto huge = MakeBuffer(fd_.get(), uint64_t{1} << 62);
+  EXPECT_THAT(huge->Map(0, 1, BufferAccessMode::kRead),
+              StatusIs(StatusCode::kInternal,
+                       HasSubstr(fmt::format("Mapping of FD: {} failed, mmap error: (Cannot "
+                                             "allocate memory), offset: 0, size: {}; Error mapping",
+                                             fd_.get(), uint64_t{1} << 62))));
 }
 
 TEST_F(HwBufferTest, CacheMaintenanceBracketsEachAccess) {

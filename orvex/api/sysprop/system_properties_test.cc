@@ -5,6 +5,7 @@
 #include <cmath>
 #include <limits>
 #include <string>
+#include <vector>
 
 #include "gmock/gmock.h"
 #include "gtest/gtest.h"
@@ -61,16 +62,40 @@ TEST_F(SystemPropertiesTest, SystemProxyReadsAndErrors) {
   EXPECT_THAT(props_.GetAs<bool>("test.sp.unset"), StatusIs(StatusCode::kInternal));
 }
 
+// Writes the platform refuses come back as errors and leave the stored value
+// as it was.
 TEST_F(SystemPropertiesTest, SystemProxyWritesInFactoryTest) {
   ASSERT_EQ(property_set("persist.vendor.camera.fatp.enable", "1"), 0);
   EXPECT_THAT(props_.Set("test.sp.written", "42"), IsOk());
   EXPECT_THAT(props_.GetAs<int>("test.sp.written"), IsOkAndHolds(42));
-  const std::string too_long(PROPERTY_VALUE_MAX, 'x');
-  EXPECT_THAT(props_.Set("test.sp.written", too_long),
-              StatusIs(StatusCode::kInternal,
-                       "API PropertyProxy returned error: -1 trying to set property with key: "
-                       "test.sp.written, and value: " +
-                           too_long));
+  EXPECT_THAT(props_.Set("ro.test.sp.once", "first"), IsOk());
+  struct Case {
+    std::string key;
+    std::string value;
+    std::string kept;  // what the key reads afterwards; empty: unset
+  };
+  const std::vector<Case> refused = {
+      {"test.sp.written", std::string(PROPERTY_VALUE_MAX, 'x'), "42"},
+      {"test.sp.written",
+       std::string("4\0"
+                   "3",
+                   3),
+       "42"},
+      {"ro.test.sp.once", "second", "first"},
+      {"test..sp.bad", "1", ""},
+  };
+  for (const Case& c : refused) {
+    SCOPED_TRACE(c.key);
+    EXPECT_THAT(props_.Set(c.key, c.value),
+                StatusIs(StatusCode::kInternal,
+                         "API PropertyProxy returned error: -1 trying to set property with key: " +
+                             c.key + ", and value: " + c.value));
+    if (c.kept.empty()) {
+      EXPECT_THAT(props_.Get(c.key), StatusIs(StatusCode::kInternal));
+    } else {
+      EXPECT_THAT(props_.Get(c.key), IsOkAndHolds(c.kept));
+    }
+  }
   ASSERT_EQ(property_set("persist.vendor.camera.fatp.enable", "0"), 0);
 }
 

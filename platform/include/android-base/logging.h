@@ -10,7 +10,9 @@
 // where <S> is the severity letter (V D I W E F). The minimum severity that
 // is written comes from the ORVEX_LOG_SEVERITY environment variable (a name
 // such as "warning" or its first letter; default INFO), read once. FATAL
-// messages are always written and then abort the process.
+// messages are always written and then abort the process. A line that cannot
+// be written is lost; a reader that has gone away does not end the process
+// with SIGPIPE.
 //
 // Thread safety: all functions may be called from any thread; each line is
 // written with a single write(2), so lines from different threads never mix.
