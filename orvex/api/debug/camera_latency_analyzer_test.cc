@@ -20,6 +20,7 @@
 #include "orvex/api/sysprop/system_properties.h"
 #include "orvex/base/path.h"
 #include "orvex/status/status_matchers.h"
+#include "platform/testing/reexec_death_test.h"
 
 namespace orvex {
 namespace {
@@ -372,7 +373,7 @@ TEST_F(LatencyAnalyzerDeathTest, FailedWriteIsAnErrorAndLeavesNoFile) {
 // The environment is read when the analyzer is first used, so this runs in
 // a fresh process.
 TEST(LatencyAnalyzerEnvironmentDeathTest, OutputDirectoryFromEnvironment) {
-  GTEST_FLAG_SET(death_test_style, "threadsafe");
+  orvex_testing::UseReexecDeathTests();
   EXPECT_EXIT(
       {
         const bool property_names =
