@@ -20,6 +20,7 @@ ctest --preset aarch64 "$@" || status=$?
 t2=$(now)
 
 echo "== vector targets (from the test log)"
-grep -h "^Vector targets exercised:" build/aarch64/Testing/Temporary/LastTest*.log | sort | uniq -c || true
+awk '/^[0-9]+\/[0-9]+ Test: /{name = $3} /^Vector targets exercised:/{print name ": " $0}' \
+  build/aarch64/Testing/Temporary/LastTest.log || true
 echo "== aarch64: configure+build $((t1 - t0))s, tests $((t2 - t1))s"
 exit "$status"
