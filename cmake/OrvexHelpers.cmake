@@ -68,6 +68,17 @@ function(orvex_set_source_units target)
   endforeach()
 endfunction()
 
+# Cross builds run the tests under an emulator (CMAKE_CROSSCOMPILING_EMULATOR).
+# Death tests that re-execute the test program need it as well, since the host
+# cannot start a foreign binary by itself: ORVEX_TEST_EXEC_WRAPPER gives them
+# the emulator's command line (see platform/testing/reexec_death_test.h).
+function(orvex_test_environment test)
+  if(CMAKE_CROSSCOMPILING_EMULATOR)
+    list(JOIN CMAKE_CROSSCOMPILING_EMULATOR " " wrapper)
+    set_property(TEST ${test} APPEND PROPERTY ENVIRONMENT "ORVEX_TEST_EXEC_WRAPPER=${wrapper}")
+  endif()
+endfunction()
+
 # orvex_test(NAME SOURCES a_test.cc ... [LIBS extra ...] [LABELS l ...]
 #            [NO_PLATFORM])
 # One test binary per unit, registered with ctest under NAME. Tests labelled
@@ -82,6 +93,7 @@ function(orvex_test name)
   orvex_target_warnings(${name})
   add_test(NAME ${name} COMMAND ${name})
   set_tests_properties(${name} PROPERTIES TIMEOUT 300)
+  orvex_test_environment(${name})
   if(T_LABELS)
     set_tests_properties(${name} PROPERTIES LABELS "${T_LABELS}")
   endif()

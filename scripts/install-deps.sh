@@ -13,10 +13,19 @@ packages=(
 )
 # Extra package groups, chosen with arguments: "asan"/"tsan" need nothing
 # beyond g++; "clang" adds the compiler and runtime for fuzzing; "coverage"
-# adds the coverage report generator.
+# adds the coverage report generator; "aarch64" adds the 64-bit Arm cross
+# compiler, the arm64 builds of the libraries (multiarch) and qemu-user to run
+# the tests.
+foreign_arch=""
 for group in "$@"; do
   case "$group" in
     clang) packages+=(clang libclang-rt-14-dev) ;;
+    aarch64)
+      foreign_arch=arm64
+      packages+=(g++-aarch64-linux-gnu qemu-user
+                 libabsl-dev:arm64 libfmt-dev:arm64 libprotobuf-dev:arm64
+                 libgtest-dev:arm64 libgmock-dev:arm64 libbenchmark-dev:arm64
+                 libhwy-dev:arm64) ;;
     tidy) packages+=(clang-tidy clang-format) ;;
     coverage) packages+=(gcovr) ;;
     *) ;;
@@ -37,5 +46,8 @@ echo "installing: ${missing[*]}" >&2
 sudo=""
 if [ "$(id -u)" -ne 0 ]; then sudo="sudo"; fi
 export DEBIAN_FRONTEND=noninteractive
+if [ -n "$foreign_arch" ] && ! dpkg --print-foreign-architectures | grep -qx "$foreign_arch"; then
+  $sudo dpkg --add-architecture "$foreign_arch"
+fi
 $sudo apt-get update -qq
 $sudo apt-get install -y -qq --no-install-recommends "${missing[@]}"

@@ -7,6 +7,7 @@
 
 #include "gmock/gmock.h"
 #include "gtest/gtest.h"
+#include "platform/testing/reexec_death_test.h"
 
 namespace {
 
@@ -40,7 +41,7 @@ TEST(HostLoggingTest, DefaultThresholdIsInfo) {
 
 TEST(HostLoggingDeathTest, ThresholdFromEnvironmentAndFatalAborts) {
   // The threshold is read once per process: re-execute for a fresh one.
-  GTEST_FLAG_SET(death_test_style, "threadsafe");
+  orvex_testing::UseReexecDeathTests();
   EXPECT_EXIT(
       {
         setenv("ORVEX_LOG_SEVERITY", "error", 1);

@@ -10,6 +10,7 @@
 
 #include "gmock/gmock.h"
 #include "gtest/gtest.h"
+#include "platform/testing/reexec_death_test.h"
 
 namespace {
 
@@ -101,7 +102,7 @@ TEST(HostPropertiesTest, ConcurrentWritersAndReaders) {
 // The store is seeded once, on first use, so seeding runs in a fresh child
 // process where nothing has touched the store yet.
 TEST(HostPropertiesDeathTest, SeedsFromFileNamedByEnvironment) {
-  GTEST_FLAG_SET(death_test_style, "threadsafe");
+  orvex_testing::UseReexecDeathTests();
   std::string dir = ::testing::TempDir() + "orvex_props_XXXXXX";
   ASSERT_NE(mkdtemp(dir.data()), nullptr);
   const std::string path = dir + "/seed.prop";

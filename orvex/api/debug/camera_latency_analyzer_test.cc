@@ -21,6 +21,7 @@
 #include "orvex/base/path.h"
 #include "orvex/base/testing/scratch_mount.h"
 #include "orvex/status/status_matchers.h"
+#include "platform/testing/reexec_death_test.h"
 
 namespace orvex {
 namespace {
@@ -420,7 +421,7 @@ TEST_F(LatencyAnalyzerDeathTest, FullAndReadOnlyDisks) {
 // The environment is read when the analyzer is first used, so this runs in
 // a fresh process.
 TEST(LatencyAnalyzerEnvironmentDeathTest, OutputDirectoryFromEnvironment) {
-  GTEST_FLAG_SET(death_test_style, "threadsafe");
+  orvex_testing::UseReexecDeathTests();
   EXPECT_EXIT(
       {
         const bool property_names =

@@ -27,6 +27,7 @@
 #include "gmock/gmock.h"
 #include "gtest/gtest.h"
 #include "orvex/status/status_matchers.h"
+#include "platform/testing/reexec_death_test.h"
 
 // ---------------------------------------------------------------------------
 // DMA_BUF_IOCTL_SYNC requests are intercepted at the system-call boundary:
@@ -688,7 +689,7 @@ TEST_F(HwBufferTest, ConcurrentMappingOfOneBuffer) {
 }
 
 TEST_F(HwBufferTest, UnmapBeyondTheBufferIsFatal) {
-  GTEST_FLAG_SET(death_test_style, "threadsafe");
+  orvex_testing::UseReexecDeathTests();
   auto buffer = MakeBuffer(3, 4096, kCachedDma);
   EXPECT_DEATH(
       { Buffer::MappedHandle(4000, nullptr, 200, BufferAccessMode::kRead, buffer); },

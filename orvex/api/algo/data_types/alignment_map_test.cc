@@ -8,6 +8,7 @@
 
 #include "gmock/gmock.h"
 #include "gtest/gtest.h"
+#include "orvex/api/algo/data_types/vector_targets_testing.h"
 #include "orvex/api/memory/allocation_spec.h"
 #include "orvex/api/memory/buffer_testing.h"
 #include "orvex/api/memory/buffer_views.h"
@@ -75,7 +76,11 @@ TEST(AlignmentMapTest, Geometry) {
                HasSubstr("Alignment map buffer could not be mapped: {type: VirtualBuffer")));
 }
 
-TEST(AlignmentMapTest, UnpacksEveryWordIntoItsOwnBuffer) {
+// Unpacking runs the vector kernels: once per target.
+class AlignmentMapVectorTest : public VectorTargetTest {};
+ORVEX_INSTANTIATE_FOR_VECTOR_TARGETS(AlignmentMapVectorTest);
+
+TEST_P(AlignmentMapVectorTest, UnpacksEveryWordIntoItsOwnBuffer) {
   // 25 words in a 100-byte map: 200 bytes of vectors, 25 of errors.
   const std::vector<uint32_t> words = {0x7FF00000, 0x80000000, 0x000FFF00, 0x000000FF,
                                        0xFFFFFFFF, 0x00100180, 0x12345678};
@@ -226,7 +231,7 @@ std::pair<std::vector<unsigned char>, std::vector<unsigned char>> UnpackBoth(
   return {Read<unsigned char>(**mv), Read<unsigned char>(**me)};
 }
 
-TEST(AlignmentMapTest, MisalignedStorageMatchesAlignedResults) {
+TEST_P(AlignmentMapVectorTest, MisalignedStorageMatchesAlignedResults) {
   // More words than one staging chunk, with every kind of field value.
   std::mt19937 rng(17);
   std::vector<uint32_t> words(3000);
@@ -237,6 +242,17 @@ TEST(AlignmentMapTest, MisalignedStorageMatchesAlignedResults) {
   auto map = AlignmentMap::Make({64 * 8, 64 * 375}, Packed(bytes, words));
   const auto want = UnpackBoth(*map, Output(bytes * 2), Output(bytes / 4));
   ASSERT_EQ(want.first.size(), bytes * 2);
+  // The aligned result itself matches a per-word decoding.
+  std::vector<int32_t> vectors(words.size() * 2);
+  std::memcpy(vectors.data(), want.first.data(), want.first.size());
+  for (size_t i = 0; i < words.size(); ++i) {
+    const auto sign_extend = [](uint32_t field) {
+      return static_cast<int32_t>(field) - ((field & 0x800u) != 0 ? 4096 : 0);
+    };
+    ASSERT_EQ(vectors[2 * i], sign_extend(words[i] >> 20)) << i;
+    ASSERT_EQ(vectors[2 * i + 1], sign_extend((words[i] >> 8) & 0xFFFu)) << i;
+    ASSERT_EQ(want.second[i], words[i] & 0xFFu) << i;
+  }
 
   // Views one byte into their sources start off every natural alignment.
   EXPECT_EQ(UnpackBoth(*map, SpanBuffer::Make(Output(bytes * 2 + 1), 1, bytes * 2, nullptr).value(),

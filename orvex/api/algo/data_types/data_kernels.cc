@@ -80,6 +80,8 @@ HalfPairSums SumInterleavedHalvesImpl(const uint16_t* HWY_RESTRICT halves, size_
   return sums;
 }
 
+int64_t TargetImpl() { return HWY_TARGET; }
+
 }  // namespace HWY_NAMESPACE
 }  // namespace orvex
 HWY_AFTER_NAMESPACE();
@@ -90,6 +92,7 @@ namespace orvex {
 HWY_EXPORT(UnpackMotionVectorsImpl);
 HWY_EXPORT(UnpackMatchingErrorsImpl);
 HWY_EXPORT(SumInterleavedHalvesImpl);
+HWY_EXPORT(TargetImpl);
 
 void UnpackMotionVectorWords(std::span<const uint32_t> words, std::span<int32_t> out) {
   ORVEX_CHECK_GE(out.size(), 2 * words.size());
@@ -105,6 +108,8 @@ HalfPairSums SumInterleavedHalves(std::span<const uint16_t> halves) {
   ORVEX_CHECK_EQ(halves.size() % 2, 0u);
   return HWY_DYNAMIC_DISPATCH(SumInterleavedHalvesImpl)(halves.data(), halves.size());
 }
+
+int64_t DataKernelsTarget() { return HWY_DYNAMIC_DISPATCH(TargetImpl)(); }
 
 }  // namespace orvex
 #endif  // HWY_ONCE

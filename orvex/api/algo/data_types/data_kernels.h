@@ -36,6 +36,11 @@ struct HalfPairSums {
 };
 ORVEX_EXPORT HalfPairSums SumInterleavedHalves(std::span<const uint16_t> halves);
 
+// The instruction set the kernels above currently dispatch to, as a Highway
+// target bit (HWY_NEON, HWY_SVE2, HWY_AVX2, ...). Tests use it to check that
+// restricting the supported targets really switches the code path.
+ORVEX_EXPORT int64_t DataKernelsTarget();
+
 }  // namespace orvex
 
 #endif  // ORVEX_API_ALGO_DATA_TYPES_DATA_KERNELS_H_

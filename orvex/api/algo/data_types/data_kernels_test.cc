@@ -7,6 +7,7 @@
 #include "gmock/gmock.h"
 #include "gtest/gtest.h"
 #include "orvex/api/algo/data_types/local_tone_mapping_data_v1.h"
+#include "orvex/api/algo/data_types/vector_targets_testing.h"
 
 namespace orvex {
 namespace {
@@ -42,7 +43,11 @@ std::vector<uint32_t> WordPatterns(size_t random_count) {
   return words;
 }
 
-TEST(DataKernelsTest, MatchScalarReferenceForEveryLengthAndOffset) {
+// Every test runs once per vector target the machine supports.
+class DataKernelsTest : public VectorTargetTest {};
+ORVEX_INSTANTIATE_FOR_VECTOR_TARGETS(DataKernelsTest);
+
+TEST_P(DataKernelsTest, MatchScalarReferenceForEveryLengthAndOffset) {
   const std::vector<uint32_t> all = WordPatterns(4096);
   std::vector<int32_t> want_mv;
   std::vector<uint8_t> want_err;
@@ -71,7 +76,7 @@ TEST(DataKernelsTest, MatchScalarReferenceForEveryLengthAndOffset) {
   }
 }
 
-TEST(DataKernelsTest, HalfPairSums) {
+TEST_P(DataKernelsTest, HalfPairSums) {
   std::mt19937 rng(9);
   std::uniform_real_distribution<float> value(-4.0f, 4.0f);
   for (size_t pairs : {0u, 1u, 3u, 8u, 17u, 192u, 1001u}) {

@@ -10,6 +10,7 @@
 
 #include "gmock/gmock.h"
 #include "gtest/gtest.h"
+#include "orvex/api/algo/data_types/vector_targets_testing.h"
 #include "orvex/status/status_matchers.h"
 
 namespace orvex {
@@ -142,7 +143,12 @@ TEST(LocalToneMappingTest, GuideCurveSelectsAndClampsBins) {
   for (int i = 1; i < 8; ++i) EXPECT_NEAR(lut[i], 2.0f + i, 1e-4f) << i;
 }
 
-TEST(LocalToneMappingTest, StridedLayoutsGiveTheSameCurve) {
+// The packed layout takes the vector kernel (once per target); the planar
+// one the scalar loop.
+class LocalToneMappingVectorTest : public VectorTargetTest {};
+ORVEX_INSTANTIATE_FOR_VECTOR_TARGETS(LocalToneMappingVectorTest);
+
+TEST_P(LocalToneMappingVectorTest, StridedLayoutsGiveTheSameCurve) {
   std::mt19937 rng(11);
   std::uniform_real_distribution<float> slope(0.25f, 3.0f);
   std::uniform_real_distribution<float> bias(-0.2f, 0.2f);
