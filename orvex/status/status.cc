@@ -193,21 +193,22 @@ StatusCode StatusCodeFromErrno(int errnum) {
   return kErrnoTable[static_cast<size_t>(errnum)];
 }
 
+std::string ErrnoText(int errnum) {
+  log_internal::ErrnoSaver errno_saver;
+  char buf[100];
+  buf[0] = '\0';
+  std::string text = StrerrorResult(strerror_r(errnum, buf, sizeof(buf)), buf);
+  if (text.empty()) {
+    snprintf(buf, sizeof(buf), "Unknown error %d", errnum);
+    text = buf;
+  }
+  return text;
+}
+
 Status StatusFromErrno(int errnum, std::string_view message) {
   const StatusCode code = StatusCodeFromErrno(errnum);
   if (code == StatusCode::kOk) return OkStatus();
-  std::string errno_text;
-  {
-    log_internal::ErrnoSaver errno_saver;
-    char buf[100];
-    buf[0] = '\0';
-    errno_text = StrerrorResult(strerror_r(errnum, buf, sizeof(buf)), buf);
-    if (errno_text.empty()) {
-      snprintf(buf, sizeof(buf), "Unknown error %d", errnum);
-      errno_text = buf;
-    }
-  }
-  return Status(code, Concat({message, ": ", errno_text}));
+  return Status(code, Concat({message, ": ", ErrnoText(errnum)}));
 }
 
 }  // namespace orvex

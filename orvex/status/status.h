@@ -239,6 +239,10 @@ ORVEX_EXPORT Status Annotate(const Status& status, std::string_view message);
 // kUnknown.
 ORVEX_EXPORT StatusCode StatusCodeFromErrno(int errnum);
 
+// The text strerror_r gives for `errnum` ("No such file or directory"), or
+// "Unknown error <errnum>" when it gives none. errno is preserved.
+ORVEX_EXPORT std::string ErrnoText(int errnum);
+
 // The status of StatusCodeFromErrno(errnum) with the message
 // "<message>: <strerror text>" (the separator is written even for an empty
 // message). errnum 0 gives OK. errno is preserved.

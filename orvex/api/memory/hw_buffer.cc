@@ -19,17 +19,6 @@ namespace {
 // Read once while the library is loaded.
 const int64_t kPageSize = sysconf(_SC_PAGESIZE);
 
-// strerror_r comes in a GNU and an XSI flavour.
-[[maybe_unused]] const char* ErrorText(const char* result, const char* /*buf*/) { return result; }
-[[maybe_unused]] const char* ErrorText(int result, const char* buf) {
-  return result == 0 ? buf : "Unknown error";
-}
-
-std::string ErrnoText(int errnum) {
-  char buf[128] = {};
-  return ErrorText(strerror_r(errnum, buf, sizeof(buf)), buf);
-}
-
 int ModeIndex(BufferAccessMode mode) { return static_cast<int>(mode); }
 
 bool IsValidMode(BufferAccessMode mode) {
