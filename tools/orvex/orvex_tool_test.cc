@@ -453,17 +453,9 @@ TEST(LayoutTest, ConformanceVerdictAndExitStatus) {
 
 TEST(LayoutTest, ErrorsGoToStderrWithExitTwo) {
   ExpectErrors({
-      {{"layout", "30", "32", "YV12"},
-       "INVALID_ARGUMENT: image width should be a multiple of 4, 30 % 4 = 2; YV12 dimension "
-       "requirements not met\n"},
-      {{"layout", "64", "64", "RGB_888"},
-       "UNIMPLEMENTED: Unsupported HalPixelFormat: RGB_888, unable to make ImageFormat.\n"},
       {{"layout", "64", "64", "0x1234"},
        "UNIMPLEMENTED: Unsupported HalPixelFormat: UnknownFormat_0x1234, unable to make "
        "ImageFormat.\n"},
-      {{"layout", "64", "64", "RAW10", "--order", "CbCr"},
-       "INVALID_ARGUMENT: Specifying interleaved pixel order for format: RAW10 is not "
-       "supported\n"},
       {{"layout", "abc", "64", "RAW10"},
        "orvex layout: WIDTH must be a whole number, got 'abc'\nRun 'orvex layout --help' for "
        "usage.\n"},
@@ -883,9 +875,6 @@ TEST(DemoTest, Errors) {
       {{"demo", "extra"}, "orvex demo: unexpected argument 'extra'" + hint},
       {{"demo", "--format", "RGB_888", "--out", dir.path()},
        "UNIMPLEMENTED: Unsupported HalPixelFormat: RGB_888, unable to make ImageFormat.\n"},
-      {{"demo", "--size", "63x32", "--out", dir.path()},
-       "INVALID_ARGUMENT: image width should be a multiple of 2, 63 % 2 = 1; YCBCR_420_888 "
-       "dimension requirements not met\n"},
       {{"demo", "--size", "30000x30000", "--out", dir.path()},
        "RESOURCE_EXHAUSTED: a 30000x30000 YCBCR_420_888 frame takes 1350000000 bytes; the demo "
        "allows at most 1073741824 per frame\n"},
