@@ -85,11 +85,11 @@ class ORVEX_EXPORT CameraLatencyAnalyzer {
   // (see above).
   void InjectEvent(std::string_view operation, std::list<std::pair<std::string, float>> events);
 
-  // As above; in addition `*written_path` (not null) receives the path of
-  // the file that this very call wrote when it closed the session, and is
-  // cleared otherwise (no close, nothing to write, a failed write). Since the
-  // whole call runs under the analyzer's mutex, each of several threads
-  // learns only the file of its own close.
+  // As above, and tells the caller which file it wrote: `*written_path`
+  // (when not null) receives the path of the file that this very call wrote
+  // at a close, and is cleared otherwise (no close, a close that writes no
+  // file or fails to). The whole call runs under the analyzer's mutex, so
+  // each of several threads learns only the file of its own close.
   void InjectEvent(std::string_view operation, std::list<std::pair<std::string, float>> events,
                    std::string* written_path);
 
