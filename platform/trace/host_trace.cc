@@ -53,6 +53,8 @@ class Recorder {
       }
     }
     file_ = file;
+    path_ = path;
+    write_error_ = 0;
     named_threads_.clear();
     std::fputs("[\n", file_);
     first_event_ = true;
@@ -67,14 +69,25 @@ class Recorder {
     return 0;
   }
 
-  void Stop() {
+  // 0, or -1 with errno set to the first write or close error of the
+  // recording just finished.
+  int Stop() {
     std::lock_guard<std::mutex> lock(mutex_);
-    FinishLocked();
+    const int error = FinishLocked();
+    if (error == 0) return 0;
+    errno = error;
+    return -1;
   }
 
   void Flush() {
     std::lock_guard<std::mutex> lock(mutex_);
-    if (file_ != nullptr) std::fflush(file_);
+    if (file_ != nullptr && std::fflush(file_) != 0) NoteWriteErrorLocked();
+  }
+
+  // The file of the current or last recording.
+  std::string path() {
+    std::lock_guard<std::mutex> lock(mutex_);
+    return path_;
   }
 
   // Records one event of phase `ph` for the calling thread. `name` is
@@ -160,23 +173,41 @@ class Recorder {
     EmitLocked(event);
   }
 
-  void EmitLocked(const std::string& event) {
-    if (!first_event_) std::fputs(",\n", file_);
-    first_event_ = false;
-    std::fwrite(event.data(), 1, event.size(), file_);
+  // Keeps the first failure: once a write has failed the file is cut short
+  // and later events are not written.
+  void NoteWriteErrorLocked() {
+    if (write_error_ == 0) write_error_ = errno != 0 ? errno : EIO;
   }
 
-  void FinishLocked() {
-    if (file_ == nullptr) return;
+  void EmitLocked(const std::string& event) {
+    if (write_error_ != 0) return;
+    if ((!first_event_ && std::fputs(",\n", file_) == EOF) ||
+        std::fwrite(event.data(), 1, event.size(), file_) != event.size()) {
+      NoteWriteErrorLocked();
+    }
+    first_event_ = false;
+  }
+
+  // Closes the event array and the file; returns 0 or the errno of the first
+  // failed write, flush or close.
+  int FinishLocked() {
+    if (file_ == nullptr) return 0;
     __atomic_store_n(&atrace_marker_fd, -1, __ATOMIC_RELAXED);
     __atomic_store_n(&atrace_enabled_tags, uint64_t{0}, __ATOMIC_RELAXED);
-    std::fputs("\n]\n", file_);
-    std::fclose(file_);
+    if (write_error_ == 0 && (std::fputs("\n]\n", file_) == EOF || std::fflush(file_) != 0)) {
+      NoteWriteErrorLocked();
+    }
+    if (std::fclose(file_) != 0) NoteWriteErrorLocked();
     file_ = nullptr;
+    const int error = write_error_;
+    write_error_ = 0;
+    return error;
   }
 
   std::mutex mutex_;
   FILE* file_ = nullptr;
+  std::string path_;
+  int write_error_ = 0;
   int marker_fd_ = -1;
   bool first_event_ = true;
   std::unordered_set<long> named_threads_;
@@ -238,7 +269,13 @@ __attribute__((constructor)) void StartFromEnvironment() {
   }
 }
 
-__attribute__((destructor)) void FinishAtExit() { GetRecorder().Stop(); }
+__attribute__((destructor)) void FinishAtExit() {
+  if (GetRecorder().Stop() != 0) {
+    const int error = errno;
+    std::fprintf(stderr, "host trace: cannot write %s: %s\n", GetRecorder().path().c_str(),
+                 std::strerror(error));
+  }
+}
 
 }  // namespace
 
@@ -267,7 +304,7 @@ HOST_TRACE_EXPORT void atrace_async_end_body(const char* name, int32_t cookie) {
 
 HOST_TRACE_EXPORT int orvex_host_trace_start(const char* path) { return GetRecorder().Start(path); }
 
-HOST_TRACE_EXPORT void orvex_host_trace_stop(void) { GetRecorder().Stop(); }
+HOST_TRACE_EXPORT int orvex_host_trace_stop(void) { return GetRecorder().Stop(); }
 
 HOST_TRACE_EXPORT void orvex_host_trace_flush(void) { GetRecorder().Flush(); }
 

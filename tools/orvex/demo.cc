@@ -6,12 +6,10 @@
 #include <condition_variable>
 #include <cstring>
 #include <deque>
-#include <filesystem>
 #include <list>
 #include <memory>
 #include <mutex>
 #include <ostream>
-#include <set>
 #include <thread>
 #include <utility>
 #include <variant>
@@ -271,16 +269,6 @@ void Consume(Pipeline& pipeline) {
     *pipeline.options->progress << "\r\033[K" << std::flush;
 }
 
-std::set<std::string> CpaFilesIn(const std::string& dir) {
-  std::set<std::string> files;
-  std::error_code error;
-  for (std::filesystem::directory_iterator it(dir, error), end; !error && it != end;
-       it.increment(error)) {
-    if (it->path().extension() == ".cpa") files.insert(it->path().string());
-  }
-  return files;
-}
-
 // Reports the run to the latency analyzer and has it write the file at the
 // closing operation; returns the file's path.
 orvex::StatusOr<std::string> WriteLatencyProfile(const DemoOptions& options,
@@ -294,14 +282,14 @@ orvex::StatusOr<std::string> WriteLatencyProfile(const DemoOptions& options,
     return orvex::InternalError(
         fmt::format("cannot set {}", orvex::kCameraPerformanceAnalyzerWriteToDiskProperty));
   }
-  const std::set<std::string> before = CpaFilesIn(options.out_dir);
   analyzer.InjectEvent("Demo-Open", std::move(open));
   analyzer.InjectEvent("Demo-Process", std::move(process));
   const float close_ms = Ms(Since(close_start));
-  analyzer.InjectEvent("Demo-Close", {{"Overall", close_ms}});
-  for (const std::string& file : CpaFilesIn(options.out_dir)) {
-    if (before.count(file) == 0) return file;
-  }
+  // The analyzer names the file this close wrote: a listing of the directory
+  // could pick up another process's file, or one when ours failed.
+  std::string written;
+  analyzer.InjectEvent("Demo-Close", {{"Overall", close_ms}}, &written);
+  if (!written.empty()) return written;
   return orvex::InternalError(fmt::format(
       "the latency analyzer wrote no .cpa file into {} (see its [CPA] log line)", options.out_dir));
 }

@@ -76,10 +76,19 @@ int RunDemoCommand(const ParsedArgs& args, CommandContext& context) {
     orvex::PerfTrace::trace_level_.store(kDemoTraceLevel);
   }
   auto report = RunDemo(options);
-  if (trace.has_value()) orvex_host_trace_stop();
-  if (!report.ok()) return context.Error(report.status());
+  // A trace cut short (full disk) is no valid JSON: never recommend it.
+  orvex::Status traced = orvex::OkStatus();
+  if (trace.has_value() && orvex_host_trace_stop() != 0) {
+    traced = orvex::StatusFromErrno(errno, fmt::format("cannot write the trace {}", *trace));
+  }
+  if (!report.ok()) {
+    if (!traced.ok()) context.Error(traced);
+    return context.Error(report.status());
+  }
 
+  // The run itself is reported even when its trace failed.
   context.out() << PrintReport(options, *report);
+  if (!traced.ok()) return context.Error(traced);
   if (trace.has_value()) {
     context.out() << fmt::format(
         "trace: {} (open it in the Perfetto UI, https://ui.perfetto.dev)\n", *trace);
@@ -102,7 +111,7 @@ const Command& DemoCommand() {
            "checksum of every plane. Prints frames processed, the verification result,\n"
            "throughput and the producer-signal-to-consumer-wake latency, and has the\n"
            "latency analyzer write a .cpa file into the output directory. Exit status 1\n"
-           "when a frame fails verification.\n\n"
+           "when a frame fails verification, 2 when the trace cannot be written in full.\n\n"
            "example: orvex demo --size 1920x1080 --format YCBCR_P010 --frames 60 --trace t.json",
        .flags = {{"size", "WxH", "frame size (default 4000x3000)"},
                  {"format", "NAME", "pixel format, name or code (default YCBCR_420_888)"},

@@ -1,6 +1,6 @@
 // orvex formats and orvex layout.
 
-#include <fstream>
+#include <algorithm>
 #include <limits>
 #include <optional>
 #include <ostream>
@@ -13,6 +13,7 @@
 #include "tools/orvex/format_names.h"
 #include "tools/orvex/json.h"
 #include "tools/orvex/layout_svg.h"
+#include "tools/orvex/output.h"
 #include "tools/orvex/table.h"
 #include "tools/orvex/tool.h"
 
@@ -157,19 +158,28 @@ int RunLayout(const ParsedArgs& args, CommandContext& context) {
       ImageFormat::Make(static_cast<int>(*width), static_cast<int>(*height), *pixel_format, order);
   if (!format.ok()) return context.Error(format.status());
 
-  if (auto svg_path = args.Get("svg")) {
-    std::ofstream svg(*svg_path, std::ios::out | std::ios::trunc);
-    svg << LayoutSvg(*format);
-    svg.close();
-    if (!svg) {
-      return context.Error(orvex::InternalError(fmt::format("cannot write {}", *svg_path)));
+  // INVALID_ARGUMENT is the answer "does not conform"; a target that cannot
+  // be checked (UNIMPLEMENTED, a code that names no format) is an error.
+  orvex::Status conformance = orvex::OkStatus();
+  if (target.has_value()) {
+    const auto known = AllHalPixelFormats();
+    conformance = std::find(known.begin(), known.end(), *target) == known.end()
+                      ? orvex::UnimplementedError(fmt::format("Unable to check if conforms to {}",
+                                                              orvex::FormatToString(*target)))
+                      : format->ConformsTo(*target, /*verbose=*/true);
+    if (!conformance.ok() && !orvex::IsInvalidArgument(conformance)) {
+      return context.Error(conformance);
     }
+  }
+
+  if (auto svg_path = args.Get("svg")) {
+    const orvex::Status written = WriteFileAtomically(*svg_path, LayoutSvg(*format));
+    if (!written.ok()) return context.Error(written);
   }
   const bool json = args.Has("json");
   context.out() << (json ? LayoutJson(*format).Dump() : LayoutText(*format));
   if (!target.has_value()) return kExitOk;
 
-  const orvex::Status conformance = format->ConformsTo(*target, /*verbose=*/true);
   const std::string verdict = fmt::format("conformance to {}: {}\n", orvex::FormatToString(*target),
                                           conformance.ok() ? "conforms" : conformance.ToString());
   // With --json stdout holds only the object; the verdict goes to stderr.
@@ -201,9 +211,9 @@ const Command& LayoutCommand() {
        .summary = "print the buffer sizes and components of an image layout",
        .details = "FORMAT is a name from 'orvex formats' (any letter case) or a numeric code,\n"
                   "decimal or 0x-hexadecimal. With --conform the exit status is 1 when the\n"
-                  "layout does not conform; with --json the verdict goes to stderr so that\n"
-                  "stdout holds only the JSON object. Library errors print the status text on\n"
-                  "stderr and exit 2.\n\n"
+                  "layout does not conform and 2 when TARGET cannot be checked; with --json\n"
+                  "the verdict goes to stderr so that stdout holds only the JSON object.\n"
+                  "Library errors print the status text on stderr and exit 2.\n\n"
                   "example: orvex layout 4000 3000 YCBCR_420_888 --conform YCBCR_420_888",
        .flags = {{"order", "CbCr|CrCb", "interleaved chroma order (default: the format's)"},
                  {"conform", "TARGET", "also check that the layout conforms to TARGET"},

@@ -10,7 +10,5 @@
 
 int main(int argc, char** argv) {
   std::vector<std::string> args(argv + 1, argv + argc);
-  const int status = orvex_tool::RunTool(args, std::cout, std::cerr, isatty(STDERR_FILENO) == 1);
-  std::cout.flush();
-  return status;
+  return orvex_tool::RunTool(args, STDOUT_FILENO, std::cerr, isatty(STDERR_FILENO) == 1);
 }

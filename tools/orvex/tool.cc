@@ -3,6 +3,7 @@
 #include <ostream>
 
 #include "fmt/format.h"
+#include "tools/orvex/output.h"
 
 namespace orvex_tool {
 namespace {
@@ -53,20 +54,21 @@ int RunTool(const std::vector<std::string>& args, std::ostream& out, std::ostrea
     return kExitError;
   }
   const std::string& name = args[0];
-  if (name == "-h" || name == "--help" || name == "help") {
-    if (name == "help" && args.size() > 1) {
-      if (const Command* command = FindCommand(args[1])) {
-        out << UsageText(command->spec);
-        return kExitOk;
-      }
-    }
+  // "help COMMAND" asks for that command's usage.
+  const bool help_for = name == "help" && args.size() > 1;
+  if ((name == "-h" || name == "--help" || name == "help") && !help_for) {
     out << ToolUsageText();
     return kExitOk;
   }
-  const Command* command = FindCommand(name);
+  const Command* command = FindCommand(help_for ? args[1] : name);
   if (command == nullptr) {
-    err << fmt::format("orvex: unknown command '{}'\n\n{}", name, ToolUsageText());
+    err << fmt::format("orvex: unknown command '{}'\n\n{}", help_for ? args[1] : name,
+                       ToolUsageText());
     return kExitError;
+  }
+  if (help_for) {
+    out << UsageText(command->spec);
+    return kExitOk;
   }
   CommandContext context(command->spec.name, out, err, terminal);
   auto parsed = ParseArgs(command->spec, std::vector<std::string>(args.begin() + 1, args.end()));
@@ -76,6 +78,16 @@ int RunTool(const std::vector<std::string>& args, std::ostream& out, std::ostrea
     return kExitOk;
   }
   return command->run(*parsed, context);
+}
+
+int RunTool(const std::vector<std::string>& args, int out_fd, std::ostream& err, bool terminal) {
+  FdOutputBuffer buffer(out_fd);
+  std::ostream out(&buffer);
+  const int code = RunTool(args, out, err, terminal);
+  out.flush();
+  if (buffer.error() == 0) return code;
+  err << orvex::StatusFromErrno(buffer.error(), "cannot write standard output").ToString() << "\n";
+  return kExitError;
 }
 
 }  // namespace orvex_tool

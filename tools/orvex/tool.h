@@ -8,7 +8,7 @@
 //
 // Exit status: 0 success; 1 a negative answer (a layout that does not
 // conform, a demo frame that failed verification); 2 an error (bad usage,
-// a library error, an unreadable file).
+// a library error, an unreadable file, output that cannot be written).
 
 #include <iosfwd>
 #include <string>
@@ -64,6 +64,14 @@ const Command& DemoCommand();
 
 // Runs the tool with `args` (the words after the program name).
 int RunTool(const std::vector<std::string>& args, std::ostream& out, std::ostream& err,
+            bool terminal = false);
+
+// As above, writing the output to the file descriptor `out_fd` (the
+// program's stdout). Output that cannot be written in full (a full disk,
+// /dev/full) is an error whatever the command answered: the errno status
+// "cannot write standard output: <errno text>" goes to `err` and the exit
+// status is kExitError.
+int RunTool(const std::vector<std::string>& args, int out_fd, std::ostream& err,
             bool terminal = false);
 
 // The top-level usage text listing the commands.

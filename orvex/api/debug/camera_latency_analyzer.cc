@@ -109,7 +109,14 @@ std::optional<float> CameraLatencyAnalyzer::LatencyThresholdMs(std::string_view 
 
 void CameraLatencyAnalyzer::InjectEvent(std::string_view operation,
                                         std::list<std::pair<std::string, float>> events) {
+  InjectEvent(operation, std::move(events), nullptr);
+}
+
+void CameraLatencyAnalyzer::InjectEvent(std::string_view operation,
+                                        std::list<std::pair<std::string, float>> events,
+                                        std::string* written_path) {
   std::lock_guard<std::mutex> lock(mutex_);
+  if (written_path != nullptr) written_path->clear();
   const CameraOperationLatencyData& record = latency_data_.emplace_back(
       CameraOperationLatencyData{std::string(operation), std::move(events)});
 
@@ -125,16 +132,20 @@ void CameraLatencyAnalyzer::InjectEvent(std::string_view operation,
       properties.GetAs<bool>(kCameraPerformanceAnalyzerAutoDumpLatencyProperty);
   if (auto_dump.ok() && !*auto_dump) threshold_exceeded_ = false;
   if (threshold_exceeded_) {
-    WriteLatencyData(true);
+    WriteLatencyData(true, written_path);
     return;
   }
   const StatusOr<bool> write_to_disk =
       properties.GetAs<bool>(kCameraPerformanceAnalyzerWriteToDiskProperty);
-  WriteLatencyData(write_to_disk.ok() && *write_to_disk);
+  WriteLatencyData(write_to_disk.ok() && *write_to_disk, written_path);
 }
 
 void CameraLatencyAnalyzer::WriteLatencyData(bool write_to_disk) {
-  if (write_to_disk && !WriteProtoToDisk("camera-ended").ok()) {
+  WriteLatencyData(write_to_disk, nullptr);
+}
+
+void CameraLatencyAnalyzer::WriteLatencyData(bool write_to_disk, std::string* written_path) {
+  if (write_to_disk && !WriteProtoToDisk("camera-ended", written_path).ok()) {
     ORVEX_LOG(ERROR) << "[CPA] Not able to write camera-ended Proto to disk";
   }
   ClearLatencyData();
@@ -165,6 +176,11 @@ CameraPerformanceDataFile CameraLatencyAnalyzer::ConvertToProto() const {
 }
 
 Status CameraLatencyAnalyzer::WriteProtoToDisk(std::string_view prefix) const {
+  return WriteProtoToDisk(prefix, nullptr);
+}
+
+Status CameraLatencyAnalyzer::WriteProtoToDisk(std::string_view prefix,
+                                               std::string* written_path) const {
   const std::string directory = output_directory();
   Status status = RecursivelyCreateDir(directory);
   if (!status.ok()) return status;
@@ -195,6 +211,7 @@ Status CameraLatencyAnalyzer::WriteProtoToDisk(std::string_view prefix) const {
     error = MoveNoReplace(temporary, path);
     if (error == 0) {
       ORVEX_LOG(INFO) << "[CPA] Camera latency data written to " << path;
+      if (written_path != nullptr) *written_path = path;
       return OkStatus();
     }
     if (error != EEXIST) break;

@@ -85,6 +85,14 @@ class ORVEX_EXPORT CameraLatencyAnalyzer {
   // (see above).
   void InjectEvent(std::string_view operation, std::list<std::pair<std::string, float>> events);
 
+  // As above, and tells the caller which file it wrote: `*written_path`
+  // (when not null) receives the path of the file that this very call wrote
+  // at a close, and is cleared otherwise (no close, a close that writes no
+  // file or fails to). The whole call runs under the analyzer's mutex, so
+  // each of several threads learns only the file of its own close.
+  void InjectEvent(std::string_view operation, std::list<std::pair<std::string, float>> events,
+                   std::string* written_path);
+
   // Writes the file (prefix "camera-ended") if `write_to_disk`, logging a
   // failure; then clears the records and the threshold flag.
   void WriteLatencyData(bool write_to_disk);
@@ -106,6 +114,9 @@ class ORVEX_EXPORT CameraLatencyAnalyzer {
   // cannot be serialized; ALREADY_EXISTS when no free name is left for this
   // second.
   Status WriteProtoToDisk(std::string_view prefix) const;
+  // As above; on success also stores the path of the file written in
+  // `*written_path` when that is not null.
+  Status WriteProtoToDisk(std::string_view prefix, std::string* written_path) const;
 
   // The threshold that an "Overall" event of `operation` is checked against,
   // or nullopt when operations of that name are not checked.
@@ -117,6 +128,9 @@ class ORVEX_EXPORT CameraLatencyAnalyzer {
 
  private:
   CameraLatencyAnalyzer();
+
+  // WriteLatencyData, storing the written file's path when not null.
+  void WriteLatencyData(bool write_to_disk, std::string* written_path);
 
   std::mutex mutex_;
   std::list<CameraOperationLatencyData> latency_data_;

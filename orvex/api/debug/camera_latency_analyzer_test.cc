@@ -312,24 +312,34 @@ TEST_F(LatencyAnalyzerTest, WriteFailuresAreReportedAndRecordsCleared) {
   EXPECT_THAT(log, HasSubstr("api/debug/camera_latency_analyzer:"));
   EXPECT_THAT(log, HasSubstr("] [CPA] Not able to write camera-ended Proto to disk\n"));
   EXPECT_EQ(RecordedOperations(), 0);
+
+  // A close whose write failed names no file.
+  SetProperty(kCameraPerformanceAnalyzerWriteToDiskProperty, "1");
+  std::string written = "stale";
+  analyzer_.InjectEvent("Camera-Close", {}, &written);
+  EXPECT_EQ(written, "");
 }
 
 TEST_F(LatencyAnalyzerTest, ConcurrentInjections) {
   SetProperty(kCameraPerformanceAnalyzerWriteToDiskProperty, "1");
   std::vector<std::thread> threads;
+  std::vector<std::string> written(8);  // by each close
   for (int t = 0; t < 4; ++t) {
-    threads.emplace_back([this, t] {
+    threads.emplace_back([this, t, &written] {
       for (int i = 0; i < 100; ++i) {
         analyzer_.InjectEvent("T" + std::to_string(t) + "-Open", {{"Overall", 1}, {"I", 1}});
-        if (i % 50 == 49) analyzer_.InjectEvent("T-Close", {{"Overall", 1}});
+        if (i % 50 == 49)
+          analyzer_.InjectEvent("T-Close", {{"Overall", 1}}, &written[t * 2 + i / 50]);
       }
     });
   }
   for (auto& thread : threads) thread.join();
-  // Eight closes, each writing what was recorded before it; every file is
-  // complete and no temporary file is left.
+  // Eight closes, each writing what was recorded before it and naming its
+  // own file; every file is complete and no temporary file is left.
   const std::vector<std::string> files = Files();
   EXPECT_EQ(files.size(), 8u);
+  std::sort(written.begin(), written.end());
+  for (size_t i = 0; i < files.size(); ++i) EXPECT_EQ(written[i], out_ + "/" + files[i]);
   int opens = 0;
   for (const std::string& name : files) {
     ASSERT_NE(name.front(), '.') << name;

@@ -1,5 +1,6 @@
 // Runs with the host trace library: markers reach the recorded trace.
 
+#include <cerrno>
 #include <cstdlib>
 #include <string>
 #include <thread>
@@ -79,6 +80,25 @@ TEST(HostTraceTest, PerfTraceLevelsGateSections) {
   }
   EXPECT_THAT(recording.Stop(),
               ElementsAre("B always" + kMe, "E" + kMe, "B detail at 5" + kMe, "E" + kMe));
+}
+
+// A failed write or close is reported by the stop call, whether the disk
+// fills part way (more events than the buffer holds) or at the end, and at
+// exit.
+TEST(HostTraceDeathTest, StopReportsFailedWrites) {
+  for (int events : {1, 100}) {
+    SCOPED_TRACE(events);
+    ASSERT_EQ(orvex_host_trace_start("/dev/full"), 0);
+    for (int i = 0; i < events; ++i) ScopedTrace::TraceInt("counter", i);
+    EXPECT_EQ(orvex_host_trace_stop(), -1);
+    EXPECT_EQ(errno, ENOSPC);
+  }
+  EXPECT_EXIT(
+      {
+        orvex_host_trace_start("/dev/full");
+        exit(0);
+      },
+      ::testing::ExitedWithCode(0), "host trace: cannot write /dev/full: No space left on device");
 }
 
 // Registered a second time with ORVEX_TRACE_FILE set (see CMakeLists.txt).

@@ -10,8 +10,9 @@
 // environment variable ORVEX_TRACE_FILE, if set; ORVEX_TRACE_TAGS (a number,
 // 0x-prefixed for hexadecimal) chooses the enabled categories, by default
 // ATRACE_TAG_ALWAYS | ATRACE_TAG_CAMERA. The file is completed at process
-// exit. Without ORVEX_TRACE_FILE, atrace_marker_fd stays -1 and every entry
-// point does nothing until orvex_host_trace_start() is called.
+// exit, and a failed write is then reported on stderr. Without
+// ORVEX_TRACE_FILE, atrace_marker_fd stays -1 and every entry point does
+// nothing until orvex_host_trace_start() is called.
 //
 // Recorded: sections (ph "B"/"E"), counters ("C", args.value), asynchronous
 // sections ("b"/"e", id = cookie), each with a timestamp in microseconds of
@@ -28,16 +29,20 @@ extern "C" {
 #endif
 
 // Starts recording into `path` (created or truncated), finishing any current
-// recording first. Returns 0, or -1 with errno set when the file cannot be
-// opened (recording then stays off).
+// recording first (stop it before to learn whether it was written in full).
+// Returns 0, or -1 with errno set when the file cannot be opened (recording
+// then stays off).
 int orvex_host_trace_start(const char* path);
 
 // Finishes the current recording: closes the event array and the file and
-// sets atrace_marker_fd to -1 and atrace_enabled_tags to 0. Does nothing when
-// not recording.
-void orvex_host_trace_stop(void);
+// sets atrace_marker_fd to -1 and atrace_enabled_tags to 0. Returns 0, or -1
+// with errno set to the first error met while writing, flushing or closing
+// the file (a full disk, a file-size limit): the file is then cut short and
+// is no valid JSON. Returns 0 when not recording.
+int orvex_host_trace_stop(void);
 
-// Writes buffered events to the file.
+// Writes buffered events to the file; a failure is reported by the next
+// orvex_host_trace_stop().
 void orvex_host_trace_flush(void);
 
 #ifdef __cplusplus

@@ -32,7 +32,7 @@ class TraceRecording {
   }
 
   std::vector<std::string> Stop() {
-    orvex_host_trace_stop();
+    EXPECT_EQ(orvex_host_trace_stop(), 0) << path_;
     return ReadEvents(path_);
   }
 
