@@ -11,13 +11,17 @@
 #include <string>
 #include <vector>
 
+#include "cutils/properties.h"
+#include "expat.h"
 #include "gmock/gmock.h"
 #include "google/protobuf/util/json_util.h"
 #include "gtest/gtest.h"
+#include "orvex/api/debug/camera_latency_analyzer.h"
 #include "orvex/api/debug/camera_performance_analyzer.pb.h"
 #include "orvex/api/memory/hal_pixel_format.h"
 #include "orvex/status/status_matchers.h"
 #include "tools/orvex/args.h"
+#include "tools/orvex/cpa.h"
 #include "tools/orvex/demo.h"
 #include "tools/orvex/format_names.h"
 #include "tools/orvex/json.h"
@@ -110,7 +114,7 @@ const CommandSpec& TestSpec() {
       .positional_count = 2,
       .summary = "a test command",
       .details = "",
-      .flags = {{"json", "", "json output"}, {"out", "DIR", "output directory"}}};
+      .flags = {{"json", "", "json output"}, {"out", "DIR", "output directory", 'o'}}};
   return spec;
 }
 
@@ -128,6 +132,7 @@ TEST(ArgsTest, AcceptsFlagShapes) {
       {{"a", "--", "--json"}, {"a", "--json"}, "", false},
       {{"-5", "-0x10"}, {"-5", "-0x10"}, "", false},
       {{"a", "b", "--out="}, {"a", "b"}, "", false},
+      {{"a", "-o", "d", "b"}, {"a", "b"}, "d", false},
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(::testing::PrintToString(c.args));
@@ -167,8 +172,8 @@ TEST(ArgsTest, HelpSkipsThePositionalCount) {
   EXPECT_TRUE(parsed->help);
   EXPECT_THAT(UsageText(TestSpec()),
               AllOf(StartsWith("usage: orvex test A B [flags]\n\na test command\n"),
-                    HasSubstr("  --out DIR   output directory\n"),
-                    HasSubstr("  -h, --help  print this help and exit\n")));
+                    HasSubstr("  -o, --out DIR  output directory\n"),
+                    HasSubstr("  -h, --help     print this help and exit\n")));
 }
 
 TEST(ArgsTest, ParsesNumbers) {
@@ -271,8 +276,8 @@ TEST(ToolTest, TopLevelUsageAndUnknownCommand) {
 }
 
 TEST(ToolTest, EveryCommandHasHelp) {
-  for (const Command* command :
-       {&DemoCommand(), &FormatsCommand(), &LayoutCommand(), &PyramidCommand(), &CpaCommand()}) {
+  for (const Command* command : {&DemoCommand(), &FormatsCommand(), &LayoutCommand(),
+                                 &RenderCommand(), &PyramidCommand(), &CpaCommand()}) {
     const std::string name(command->spec.name);
     SCOPED_TRACE(name);
     RunResult result = RunOrvex({name, "--help"});
@@ -625,10 +630,6 @@ TEST(CpaTest, UnreadableAndCorruptFilesAreErrors) {
   EXPECT_EQ(absent.code, kExitError);
   EXPECT_EQ(absent.err, "NOT_FOUND: cannot open " + missing + ": No such file or directory\n");
 
-  RunResult directory = RunOrvex({"cpa", dir.path()});
-  EXPECT_EQ(directory.code, kExitError);
-  EXPECT_EQ(directory.err, "FAILED_PRECONDITION: cannot read " + dir.path() + ": Is a directory\n");
-
   struct Case {
     std::string name;
     std::string bytes;
@@ -655,6 +656,115 @@ TEST(CpaTest, UnreadableAndCorruptFilesAreErrors) {
                                 std::to_string(c.bytes.size()) + " bytes)\n");
     }
   }
+}
+
+TEST(CpaTest, HostileInputIsBoundedAndEscaped) {
+  ScratchDir dir;
+  // Far over 2 GiB: refused before anything is read (sparse, no disk used).
+  const std::string huge = dir.path() + "/huge.cpa";
+  WriteFile(huge, "");
+  ASSERT_EQ(truncate(huge.c_str(), off_t{3} << 30), 0);
+  ExpectErrors({{{"cpa", huge},
+                 "INVALID_ARGUMENT: " + huge +
+                     " is 3221225472 bytes, more than the 2147483647 a .cpa file can hold\n"}});
+  // A device that never ends is parsed as it is read: its first byte ends it.
+  RunResult zero = RunOrvex({"cpa", "/dev/zero"});
+  EXPECT_EQ(zero.code, kExitError);
+  EXPECT_THAT(zero.err, StartsWith("INVALID_ARGUMENT: /dev/zero is not a valid .cpa file"));
+  // A stream of valid records is cut off at the limit.
+  int fds[2];
+  ASSERT_EQ(pipe(fds), 0);
+  std::string records;
+  for (int i = 0; i < 50; ++i) records += std::string("\x1a\x00", 2);  // empty latency data
+  ASSERT_EQ(write(fds[1], records.data(), records.size()), static_cast<ssize_t>(records.size()));
+  close(fds[1]);
+  const std::string stream = "/dev/fd/" + std::to_string(fds[0]);
+  EXPECT_THAT(ReadCpaFile(stream, 64).status(),
+              StatusIs(orvex::StatusCode::kInvalidArgument,
+                       stream + " goes on past 64 bytes, more than a .cpa file can hold"));
+  EXPECT_THAT(ReadCpaFile(stream, 200).status(), IsOk());  // the rest of it, within the limit
+  close(fds[0]);
+
+  // Names cannot drive the terminal: control characters print escaped.
+  orvex::CameraPerformanceDataFile file;
+  orvex::CameraLatencyData* operation = file.add_camera_latency_data();
+  operation->set_operation_case("\x1b]0;owned\x07Open");
+  operation->add_latency_data()->set_event_name(std::string("A\0B\xc2\x9b\\", 6));
+  const std::string path = dir.path() + "/names.cpa";
+  WriteFile(path, file.SerializeAsString());
+  for (const std::vector<std::string>& args :
+       {std::vector<std::string>{"cpa", path}, std::vector<std::string>{"cpa", path, path}}) {
+    SCOPED_TRACE(args.size());
+    RunResult result = RunOrvex(args);
+    EXPECT_EQ(result.code, kExitOk) << result.err;
+    EXPECT_THAT(result.out,
+                AllOf(HasSubstr("\\x1b]0;owned\\x07Open"), HasSubstr("A\\x00B\\u009b\\\\")));
+    EXPECT_EQ(result.out.find_first_of(std::string("\x1b\x07\0", 3)), std::string::npos);
+  }
+}
+
+// Counts the points of a chart; false when it is not well-formed XML.
+bool CountPoints(const std::string& svg, int& points, int& slow) {
+  struct Counts {
+    int& points;
+    int& slow;
+  } counts{points, slow};
+  XML_Parser parser = XML_ParserCreate(nullptr);
+  XML_SetUserData(parser, &counts);
+  XML_SetStartElementHandler(parser, [](void* data, const XML_Char* name, const XML_Char** attrs) {
+    if (std::string_view(name) != "circle") return;
+    auto* c = static_cast<Counts*>(data);
+    ++c->points;
+    for (int i = 0; attrs[i] != nullptr; i += 2) {
+      if (std::string_view(attrs[i]) == "fill" && std::string_view(attrs[i + 1]) == "#c0392b") {
+        ++c->slow;
+      }
+    }
+  });
+  const bool parsed =
+      XML_Parse(parser, svg.data(), static_cast<int>(svg.size()), /*isFinal=*/1) == XML_STATUS_OK;
+  XML_ParserFree(parser);
+  return parsed;
+}
+
+TEST(CpaTest, ManySessionsWrittenByTheAnalyzer) {
+  ScratchDir dir;
+  orvex::CameraLatencyAnalyzer& analyzer = orvex::CameraLatencyAnalyzer::GetAnalyzer();
+  analyzer.SetOutputDirectory(dir.path());
+  ASSERT_EQ(property_set(orvex::kCameraPerformanceAnalyzerWriteToDiskProperty, "true"), 0);
+  for (float open_ms : {100.0f, 350.0f, 200.0f}) {
+    analyzer.InjectEvent("Camera-Open", {{"Overall", open_ms}, {"SensorPowerUp", 40.0f}});
+    analyzer.InjectEvent("Camera-Close", {{"Overall", 50.0f}});
+  }
+  const std::string bad = dir.path() + "/bad.cpa";
+  WriteFile(bad, "this is not a profile\n");
+  const std::string svg = dir.path() + "/chart.svg";
+
+  RunResult text = RunOrvex({"cpa", dir.path(), "--svg", svg});
+  EXPECT_EQ(text.code, kExitError);
+  EXPECT_EQ(text.err, "skipped: INVALID_ARGUMENT: " + bad +
+                          " is not a valid .cpa file: it does not parse as a "
+                          "CameraPerformanceDataFile message (22 bytes)\n");
+  EXPECT_THAT(text.out,
+              AllOf(StartsWith("3 sessions, "),
+                    HasSubstr("\nCamera-Open (3 sessions, threshold 300 ms: 1 over)\n"
+                              "EVENT          COUNT  MIN (ms)  MEDIAN (ms)  P90 (ms)  MAX (ms)\n"
+                              "Overall            3   100.000      200.000   350.000   350.000\n"
+                              "SensorPowerUp      3    40.000       40.000    40.000    40.000\n"),
+                    HasSubstr("\nCamera-Close (3 sessions, threshold 250 ms: 0 over)\n")));
+  // Sessions in time order: only the second one was slow.
+  EXPECT_THAT(text.out, testing::ContainsRegex("\nsessions in time order:\nTIME +FILE +OPERATIONS "
+                                               "+OVER THRESHOLD\n[^\n]+  2  -\n[^\n]+  2  "
+                                               "Camera-Open\n[^\n]+  2  -\n$"));
+  int points = 0, slow = 0;
+  EXPECT_TRUE(CountPoints(ReadFile(svg), points, slow));
+  EXPECT_EQ(points, 6);  // a point per session for each of the two operations
+  EXPECT_EQ(slow, 1);
+
+  RunResult json = RunOrvex({"cpa", dir.path() + "/", "--json"});
+  EXPECT_EQ(json.code, kExitError);
+  EXPECT_THAT(json.out, HasSubstr("{\"event\": \"Overall\", \"count\": 3, \"min_ms\": 100, "
+                                  "\"median_ms\": 200, \"p90_ms\": 350, \"max_ms\": 350}"));
 }
 
 }  // namespace
