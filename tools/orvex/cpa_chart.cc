@@ -1,6 +1,7 @@
 // The SVG chart of `orvex cpa --svg`.
 
 #include <algorithm>
+#include <cmath>
 #include <optional>
 #include <string>
 #include <vector>
@@ -37,7 +38,7 @@ std::vector<Panel> PanelsOf(const std::vector<CpaSession>& sessions) {
   for (size_t s = 0; s < sessions.size(); ++s) {
     for (const orvex::CameraLatencyData& data : sessions[s].file.camera_latency_data()) {
       const std::optional<float> overall = LargestOverallMs(data);
-      if (!overall) continue;
+      if (!overall || !std::isfinite(*overall)) continue;
       auto panel = std::find_if(panels.begin(), panels.end(), [&](const Panel& p) {
         return p.operation == data.operation_case();
       });
@@ -77,7 +78,9 @@ std::string CpaChartSvg(const std::vector<CpaSession>& sessions) {
     }
     const double scale_max = highest > 0 ? highest * 1.1 : 1.0;
     const int plot_top = top + 30;
-    auto y_of = [&](double ms) { return plot_top + kPlotHeight - ms / scale_max * kPlotHeight; };
+    auto y_of = [&](double ms) {
+      return plot_top + kPlotHeight - std::clamp(ms / scale_max, 0.0, 1.0) * kPlotHeight;
+    };
     body += fmt::format(
         "<text x=\"{}\" y=\"{}\" font-size=\"14\" font-weight=\"bold\">{}: Overall per "
         "session{}</text>\n",

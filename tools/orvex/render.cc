@@ -68,7 +68,9 @@ class Samples {
     }
     end = std::min<uint64_t>(
         {end, static_cast<uint64_t>(c_.row_stride_bytes), buffer_.size() - RowStart(to)});
-    std::memcpy(&buffer_[RowStart(to) + begin], &buffer_[RowStart(from) + begin], end - begin);
+    if (end > begin) {
+      std::memcpy(&buffer_[RowStart(to) + begin], &buffer_[RowStart(from) + begin], end - begin);
+    }
   }
 
   // Stores `value` so that its top 8 bits read back as `value`; the low bits
@@ -192,6 +194,11 @@ orvex::Status CheckComponent(const ImageFormat& format, const Component& c) {
       c.offset_bytes +
       static_cast<uint64_t>(c.height - 1) * static_cast<uint64_t>(c.row_stride_bytes) +
       TopByte(c.bits_per_pixel, last_sample) + 1;
+  if (TopByte(c.bits_per_pixel, last_sample) >= static_cast<uint64_t>(c.row_stride_bytes)) {
+    return orvex::InvalidArgumentError(
+        fmt::format("{}: a row of {} samples does not fit its row stride of {} bytes", what,
+                    c.width, c.row_stride_bytes));
+  }
   if (end > sizes[static_cast<size_t>(c.buffer_index)]) {
     return orvex::InvalidArgumentError(
         fmt::format("{} reaches byte {} of buffer {}, which has {} bytes", what, end,

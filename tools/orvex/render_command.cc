@@ -19,8 +19,10 @@ namespace {
 
 using orvex::ImageFormat;
 
-// The largest dump render reads: all buffers of one image together.
+// The largest dump render reads (all buffers of one image together) and the
+// largest picture it makes (16384 x 16384).
 constexpr uint64_t kMaxImageBytes = uint64_t{1} << 30;
+constexpr uint64_t kMaxPixels = uint64_t{1} << 28;
 
 // `text` (any letter case) among `names`; the index, or nullopt.
 std::optional<size_t> Choose(std::string_view text, const std::vector<std::string_view>& names) {
@@ -119,10 +121,13 @@ int RunRender(const ParsedArgs& args, CommandContext& context) {
   }
   uint64_t total = 0;
   for (size_t size : format->buffer_sizes()) total += size;
-  if (total > kMaxImageBytes) {
+  if (total > kMaxImageBytes ||
+      static_cast<uint64_t>(layout->width) * static_cast<uint64_t>(layout->height) > kMaxPixels) {
     return context.Error(orvex::ResourceExhaustedError(fmt::format(
-        "a {}x{} {} image takes {} bytes; render reads at most {}", layout->width, layout->height,
-        orvex::FormatToString(format->format()), total, kMaxImageBytes)));
+        "a {}x{} {} image takes {} bytes; render reads at most {} bytes and makes pictures of at "
+        "most {} pixels",
+        layout->width, layout->height, orvex::FormatToString(format->format()), total,
+        kMaxImageBytes, kMaxPixels)));
   }
   auto dump = ReadDump(
       *format, std::vector<std::string>(args.positionals.begin() + 3, args.positionals.end()));
