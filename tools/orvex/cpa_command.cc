@@ -13,6 +13,7 @@
 #include <vector>
 
 #include "absl/container/flat_hash_map.h"
+#include "absl/container/flat_hash_set.h"
 #include "fmt/format.h"
 #include "google/protobuf/io/zero_copy_stream_impl.h"
 #include "google/protobuf/io/zero_copy_stream_impl_lite.h"
@@ -170,18 +171,19 @@ std::vector<OperationStats> Summarise(const std::vector<CpaSession>& sessions) {
   absl::flat_hash_map<std::string, size_t> index;
   for (const CpaSession& session : sessions) {
     const std::vector<std::string> over = OverThreshold(session.file);
-    absl::flat_hash_map<std::string, bool> seen;
+    absl::flat_hash_set<std::string> seen;
     for (const orvex::CameraLatencyData& data : session.file.camera_latency_data()) {
       auto [at, added] = index.try_emplace(data.operation_case(), operations.size());
       if (added) operations.push_back({data.operation_case(), {}, 0, 0});
       OperationStats& stats = operations[at->second];
-      if (seen.try_emplace(data.operation_case(), true).second) {
+      if (seen.insert(data.operation_case()).second) {
         ++stats.sessions;
         if (std::find(over.begin(), over.end(), data.operation_case()) != over.end()) {
           ++stats.over_threshold;
         }
       }
       for (const orvex::CameraLatencyDataType& event : data.latency_data()) {
+        if (std::isnan(event.duration_ms())) continue;  // no duration to rank
         auto it = std::find_if(stats.events.begin(), stats.events.end(),
                                [&](const EventStats& e) { return e.event == event.event_name(); });
         if (it == stats.events.end()) it = stats.events.insert(it, {event.event_name(), {}});
@@ -371,8 +373,9 @@ orvex::StatusOr<orvex::CameraPerformanceDataFile> ReadCpaFile(const std::string&
   if (!parsed) {
     return orvex::InvalidArgumentError(fmt::format(
         "{} is not a valid .cpa file: it does not parse as a CameraPerformanceDataFile message "
-        "({} bytes)",
-        path, regular ? info.st_size : consumed));
+        "({})",
+        path,
+        regular ? fmt::format("{} bytes", info.st_size) : fmt::format("{} bytes read", consumed)));
   }
   return file;
 }
@@ -392,6 +395,7 @@ const Command& CpaCommand() {
                   "sessions in time order (the time in an analyzer file name, else the file's\n"
                   "modification time) with the operations whose Overall reached the latency\n"
                   "analyzer's threshold. --svg charts each operation's Overall per session.\n"
+                  "Durations that are not numbers (NaN) are left out of the statistics.\n"
                   "A file that cannot be read or parsed is reported and skipped, and the exit\n"
                   "status is 2; the others are still summarised. Files over 2 GiB are refused.\n\n"
                   "example: orvex cpa orvex-out --svg latency.svg",
