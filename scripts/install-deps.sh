@@ -10,6 +10,7 @@ packages=(
   libprotobuf-dev protobuf-compiler
   libgtest-dev libgmock-dev libbenchmark-dev
   libhwy-dev
+  libpng-dev libexpat1-dev
 )
 # Extra package groups, chosen with arguments: "asan"/"tsan" need nothing
 # beyond g++; "clang" adds the compiler and runtime for fuzzing; "coverage"
@@ -25,7 +26,7 @@ for group in "$@"; do
       packages+=(g++-aarch64-linux-gnu qemu-user
                  libabsl-dev:arm64 libfmt-dev:arm64 libprotobuf-dev:arm64
                  libgtest-dev:arm64 libgmock-dev:arm64 libbenchmark-dev:arm64
-                 libhwy-dev:arm64) ;;
+                 libhwy-dev:arm64 libpng-dev:arm64 libexpat1-dev:arm64) ;;
     tidy) packages+=(clang-tidy clang-format) ;;
     coverage) packages+=(gcovr) ;;
     *) ;;

@@ -15,6 +15,7 @@ namespace {
 const FlagSpec* FindFlag(const CommandSpec& spec, std::string_view name) {
   for (const FlagSpec& flag : spec.flags) {
     if (flag.name == name) return &flag;
+    if (name.size() == 1 && flag.short_name != '\0' && name[0] == flag.short_name) return &flag;
   }
   return nullptr;
 }
@@ -51,10 +52,11 @@ orvex::StatusOr<ParsedArgs> ParseArgs(const CommandSpec& spec,
       parsed.help = true;
       continue;
     }
-    if (arg.rfind("--", 0) != 0) {
+    const bool short_form = arg.rfind("--", 0) != 0;
+    if (short_form && (arg.size() != 2 || FindFlag(spec, arg.substr(1)) == nullptr)) {
       return orvex::InvalidArgumentError(fmt::format("unknown flag '{}'", arg));
     }
-    std::string_view body = std::string_view(arg).substr(2);
+    std::string_view body = std::string_view(arg).substr(short_form ? 1 : 2);
     std::optional<std::string> inline_value;
     if (size_t eq = body.find('='); eq != std::string_view::npos) {
       inline_value = std::string(body.substr(eq + 1));
@@ -65,12 +67,13 @@ orvex::StatusOr<ParsedArgs> ParseArgs(const CommandSpec& spec,
       return orvex::InvalidArgumentError(fmt::format("unknown flag '--{}'", body));
     }
     if (parsed.Has(flag->name)) {
-      return orvex::InvalidArgumentError(fmt::format("flag '--{}' given more than once", body));
+      return orvex::InvalidArgumentError(
+          fmt::format("flag '--{}' given more than once", flag->name));
     }
     std::string value;
     if (flag->value_name.empty()) {
       if (inline_value.has_value()) {
-        return orvex::InvalidArgumentError(fmt::format("flag '--{}' takes no value", body));
+        return orvex::InvalidArgumentError(fmt::format("flag '--{}' takes no value", flag->name));
       }
     } else if (inline_value.has_value()) {
       value = *inline_value;
@@ -78,18 +81,20 @@ orvex::StatusOr<ParsedArgs> ParseArgs(const CommandSpec& spec,
       value = args[++i];
     } else {
       return orvex::InvalidArgumentError(
-          fmt::format("flag '--{}' needs a value ({})", body, flag->value_name));
+          fmt::format("flag '--{}' needs a value ({})", flag->name, flag->value_name));
     }
     parsed.values.emplace(std::string(flag->name), std::move(value));
   }
-  if (!parsed.help && parsed.positionals.size() != spec.positional_count) {
-    if (parsed.positionals.size() > spec.positional_count) {
+  const size_t given = parsed.positionals.size();
+  if (!parsed.help && given != spec.positional_count &&
+      !(spec.more_positionals && given > spec.positional_count)) {
+    if (given > spec.positional_count) {
       return orvex::InvalidArgumentError(
           fmt::format("unexpected argument '{}'", parsed.positionals[spec.positional_count]));
     }
     return orvex::InvalidArgumentError(fmt::format(
-        "expected {} argument{} ({}), got {}", spec.positional_count,
-        spec.positional_count == 1 ? "" : "s", spec.positionals, parsed.positionals.size()));
+        "expected {}{} argument{} ({}), got {}", spec.more_positionals ? "at least " : "",
+        spec.positional_count, spec.positional_count == 1 ? "" : "s", spec.positionals, given));
   }
   return parsed;
 }
@@ -102,7 +107,9 @@ std::string UsageText(const CommandSpec& spec) {
   size_t width = std::string_view("-h, --help").size();
   std::vector<std::string> names;
   for (const FlagSpec& flag : spec.flags) {
-    std::string name = fmt::format("--{}", flag.name);
+    std::string name = flag.short_name == '\0'
+                           ? fmt::format("--{}", flag.name)
+                           : fmt::format("-{}, --{}", flag.short_name, flag.name);
     if (!flag.value_name.empty()) name += fmt::format(" {}", flag.value_name);
     width = std::max(width, name.size());
     names.push_back(std::move(name));

@@ -6,10 +6,10 @@
 // positional arguments, and parse errors come back as values the caller
 // prints (nothing here exits or throws).
 //
-// Accepted shapes: "--name value", "--name=value", boolean "--name",
-// "-h"/"--help", and "--" to end the flags. Flags and positional arguments
-// may be mixed. An argument that starts with "-" and a digit is positional
-// (so a negative number reaches the number parser and gets a clear message).
+// Accepted shapes: "--name value", "--name=value", boolean "--name", a
+// flag's one-letter form "-o value", "-h"/"--help", and "--" to end the flags. Flags and positional
+// arguments may be mixed. An argument that starts with "-" and a digit is positional (so a negative
+// number reaches the number parser and gets a clear message).
 
 #include <cstdint>
 #include <map>
@@ -27,14 +27,16 @@ struct FlagSpec {
   std::string_view name;        // without the leading "--"
   std::string_view value_name;  // empty for a boolean flag
   std::string_view help;
+  char short_name = '\0';  // "-o" for 'o'; none when '\0'
 };
 
 struct CommandSpec {
   std::string_view name;
-  std::string_view positionals;  // usage text of the positional arguments
-  size_t positional_count = 0;   // exactly this many are required
-  std::string_view summary;      // one line
-  std::string_view details;      // paragraphs printed after the flags
+  std::string_view positionals;   // usage text of the positional arguments
+  size_t positional_count = 0;    // exactly this many are required...
+  bool more_positionals = false;  // ...or at least this many, when true
+  std::string_view summary;       // one line
+  std::string_view details;       // paragraphs printed after the flags
   std::vector<FlagSpec> flags;
 };
 

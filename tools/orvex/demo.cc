@@ -10,6 +10,8 @@
 #include <memory>
 #include <mutex>
 #include <ostream>
+#include <set>
+#include <span>
 #include <thread>
 #include <utility>
 #include <variant>
@@ -24,8 +26,11 @@
 #include "orvex/api/memory/image.h"
 #include "orvex/api/memory/image_format.h"
 #include "orvex/api/thread/fence.h"
+#include "orvex/base/path.h"
 #include "orvex/status/status.h"
 #include "orvex/status/status_macros.h"
+#include "tools/orvex/output.h"
+#include "tools/orvex/render.h"
 
 namespace orvex_tool {
 namespace {
@@ -114,6 +119,60 @@ uint64_t ChecksumPlane(const uint8_t* data, size_t size) {
   return hash;
 }
 
+// Row y of a frame's picture: colour bars, a grey ramp and a hue sweep
+// above a progress bar filled up to column `filled` (the last sixteenth).
+void DemoRow(int y, int height, int filled, std::span<Rgb> row) {
+  const auto width = static_cast<int64_t>(row.size());
+  const int64_t band = int64_t{y} * 8 / height;
+  if (band == 7) {
+    if (int64_t{y} * 16 / height == 14) filled = 0;  // a dark strip above the bar
+    const auto end = row.begin() + std::clamp<int64_t>(filled, 0, width);
+    std::fill(row.begin(), end, Rgb{235, 235, 235});
+    std::fill(end, row.end(), Rgb{48, 48, 48});
+    return;
+  }
+  static constexpr Rgb kBars[] = {{235, 235, 235}, {235, 235, 16}, {16, 235, 235}, {16, 235, 16},
+                                  {235, 16, 235},  {235, 16, 16},  {16, 16, 235},  {16, 16, 16}};
+  for (int64_t x = 0; x < width; ++x) {
+    Rgb& rgb = row[static_cast<size_t>(x)];
+    if (band < 5) {
+      rgb = kBars[x * 8 / width];
+    } else if (band == 5) {
+      const auto grey = static_cast<uint8_t>(x * 256 / width);
+      rgb = {grey, grey, grey};
+    } else {
+      const int64_t hue = x * 256 * 6 / width;  // six runs of 256 steps
+      const auto up = static_cast<uint8_t>(hue % 256);
+      const auto down = static_cast<uint8_t>(255 - hue % 256);
+      const Rgb runs[] = {{255, up, 0},   {down, 255, 0}, {0, 255, up},
+                          {0, down, 255}, {up, 0, 255},   {255, 0, down}};
+      rgb = runs[hue / 256];
+    }
+  }
+}
+
+// Frames of a layout that holds samples start as a copy of one drawn
+// picture; only the progress bar's rows are drawn again for each frame.
+struct FramePicture {
+  std::vector<std::vector<uint8_t>> buffers;
+  int bar_top = 0;  // first image row of the progress bar
+};
+
+std::optional<FramePicture> MakeFramePicture(const ImageFormat& format) {
+  if (!CheckRenderable(format).ok()) return std::nullopt;
+  FramePicture picture;
+  std::vector<std::span<uint8_t>> spans;
+  for (size_t size : format.buffer_sizes()) {
+    picture.buffers.emplace_back(size, 0);
+    spans.emplace_back(picture.buffers.back());
+  }
+  const int height = format.height();
+  DrawPicture(
+      format, spans, [&](int y, std::span<Rgb> row) { DemoRow(y, height, 0, row); }, 0, height);
+  picture.bar_top = static_cast<int>((int64_t{height} * 7 + 7) / 8);
+  return picture;
+}
+
 // One heap buffer with its own software fence per buffer of the format.
 orvex::StatusOr<std::shared_ptr<Image>> MakeFrameImage(orvex::HeapAllocator& allocator,
                                                        const ImageFormat& format) {
@@ -162,17 +221,47 @@ uint64_t PlaneSeed(int frame, size_t plane) {
   return Mix((static_cast<uint64_t>(frame) << 32) ^ (plane + 1));
 }
 
-orvex::Status WriteFrame(Frame& frame, const std::vector<Plane>& planes, bool corrupt) {
+// Copies the picture into the mapped buffers and draws frame `index` of
+// `frames` on its progress bar.
+orvex::Status DrawFrame(const Image::MappedImage& mapped, const FramePicture& picture, int index,
+                        int frames) {
+  const ImageFormat& format = mapped.format();
+  std::vector<std::span<uint8_t>> buffers;
+  for (size_t b = 0; b < picture.buffers.size(); ++b) {
+    if (b >= mapped.handles().size() || mapped.handles()[b]->size() < picture.buffers[b].size()) {
+      return orvex::InternalError(
+          fmt::format("buffer {} of frame {} is not mapped whole", b, index));
+    }
+    auto* data = static_cast<uint8_t*>(mapped.handles()[b]->data());
+    std::memcpy(data, picture.buffers[b].data(), picture.buffers[b].size());
+    buffers.emplace_back(data, picture.buffers[b].size());
+  }
+  const int width = format.width();
+  const int height = format.height();
+  const int filled = static_cast<int>(int64_t{width} * (index + 1) / frames);
+  DrawPicture(
+      format, buffers, [&](int y, std::span<Rgb> row) { DemoRow(y, height, filled, row); },
+      picture.bar_top, height);
+  return orvex::OkStatus();
+}
+
+orvex::Status WriteFrame(Frame& frame, const std::vector<Plane>& planes,
+                         const FramePicture* picture, int frames, bool corrupt) {
   ORVEX_ASSIGN_OR_RETURN(
       std::shared_ptr<Image::MappedImage> mapped,
       Image::MappedImage::Make(frame.image.get(), orvex::BufferAccessMode::kWrite));
+  if (picture != nullptr) {
+    ORVEX_RETURN_IF_ERROR(DrawFrame(*mapped, *picture, frame.index, frames));
+  }
   for (size_t p = 0; p < planes.size(); ++p) {
     uint8_t* data = mapped->GetPointer(planes[p].component);
     if (data == nullptr) {
       return orvex::InternalError(
           fmt::format("plane {} of frame {} is not mapped", p, frame.index));
     }
-    frame.expected.push_back(FillPlane(data, planes[p].bytes, PlaneSeed(frame.index, p)));
+    frame.expected.push_back(picture != nullptr
+                                 ? ChecksumPlane(data, planes[p].bytes)
+                                 : FillPlane(data, planes[p].bytes, PlaneSeed(frame.index, p)));
   }
   if (corrupt && !planes.empty()) {
     uint8_t* data = mapped->GetPointer(planes.back().component);
@@ -187,10 +276,12 @@ struct Pipeline {
   const ImageFormat* format;
   const std::vector<Plane>* planes;
   const DemoOptions* options;
+  const FramePicture* picture;  // null when the layout holds no samples to draw
   FrameQueue queue;
   orvex::Status producer_status;  // written by the producer, read after join
   DemoReport* report;             // written by the consumer, read after join
   Clock::time_point first_verified;
+  std::shared_ptr<Image> last_image;  // written by the consumer, read after join
 };
 
 void Produce(Pipeline& pipeline) {
@@ -206,7 +297,8 @@ void Produce(Pipeline& pipeline) {
     frame->image = *image;
     pipeline.queue.Push(frame);
     const orvex::Status written =
-        WriteFrame(*frame, *pipeline.planes, pipeline.options->corrupt_frame == i);
+        WriteFrame(*frame, *pipeline.planes, pipeline.picture, pipeline.options->frames,
+                   pipeline.options->corrupt_frame == i);
     frame->signalled = Clock::now();
     // A failed write reaches the consumer as the frame's status.
     const orvex::Status signalled = frame->image->SignalFences(written);
@@ -224,6 +316,7 @@ void Consume(Pipeline& pipeline) {
   const std::vector<Plane>& planes = *pipeline.planes;
   while (std::shared_ptr<Frame> frame = pipeline.queue.Pop()) {
     orvex::ScopedTrace trace("orvex demo: consume frame");
+    pipeline.last_image = frame->image;
     const orvex::FenceWaitResult result = frame->image->WaitForDone(kWaitLimit);
     const Clock::time_point woke = Clock::now();
     ++report.frames_processed;
@@ -294,6 +387,25 @@ orvex::StatusOr<std::string> WriteLatencyProfile(const DemoOptions& options,
       "the latency analyzer wrote no .cpa file into {} (see its [CPA] log line)", options.out_dir));
 }
 
+// Writes each buffer of `image` to "frame-<index>-buffer-<b>.raw" in `dir`.
+orvex::StatusOr<std::vector<std::string>> DumpFrame(const Image& image, int index,
+                                                    const std::string& dir) {
+  ORVEX_RETURN_IF_ERROR(orvex::RecursivelyCreateDir(dir));
+  ORVEX_ASSIGN_OR_RETURN(std::shared_ptr<Image::MappedImage> mapped,
+                         Image::MappedImage::Make(&image, orvex::BufferAccessMode::kRead));
+  const std::vector<size_t>& sizes = image.GetFormat().buffer_sizes();
+  std::vector<std::string> files;
+  for (size_t b = 0; b < sizes.size() && b < mapped->handles().size(); ++b) {
+    const auto& handle = mapped->handles()[b];
+    const std::string path = orvex::JoinPath(dir, fmt::format("frame-{}-buffer-{}.raw", index, b));
+    ORVEX_RETURN_IF_ERROR(
+        WriteFileAtomically(path, std::string_view(static_cast<const char*>(handle->data()),
+                                                   std::min<uint64_t>(handle->size(), sizes[b]))));
+    files.push_back(path);
+  }
+  return files;
+}
+
 }  // namespace
 
 absl::Duration Percentile(std::vector<absl::Duration> values, double p) {
@@ -320,26 +432,37 @@ orvex::StatusOr<DemoReport> RunDemo(const DemoOptions& options) {
         options.size.height, report.format_name, report.bytes_per_frame, kMaxFrameBytes));
   }
   const std::vector<Plane> planes = PlanesOf(format);
+  // Drawing the picture is the demo's own set-up, not part of opening.
+  const Clock::time_point picture_start = Clock::now();
+  const std::optional<FramePicture> picture = MakeFramePicture(format);
+  const absl::Duration draw_picture = Since(picture_start);
 
   Pipeline pipeline{
       .allocator = std::make_shared<orvex::HeapAllocator>(orvex::FenceType::kSoftware),
       .format = &format,
       .planes = &planes,
       .options = &options,
+      .picture = picture.has_value() ? &*picture : nullptr,
       .queue = {},
       .producer_status = orvex::OkStatus(),
       .report = &report,
-      .first_verified = {}};
+      .first_verified = {},
+      .last_image = nullptr};
   const Clock::time_point threads_start = Clock::now();
   std::thread consumer(Consume, std::ref(pipeline));
   std::thread producer(Produce, std::ref(pipeline));
-  const absl::Duration open_overall = Since(start);
+  const absl::Duration open_overall = Since(start) - draw_picture;
   const absl::Duration start_threads = Since(threads_start);
   producer.join();
   consumer.join();
   const Clock::time_point done = Clock::now();
   report.elapsed = Since(threads_start, done);
   ORVEX_RETURN_IF_ERROR(pipeline.producer_status);
+  if (!options.dump_dir.empty() && pipeline.last_image != nullptr) {
+    ORVEX_ASSIGN_OR_RETURN(
+        report.dump_files,
+        DumpFrame(*pipeline.last_image, report.frames_processed - 1, options.dump_dir));
+  }
 
   const int frames = std::max(report.frames_processed, 1);
   std::list<std::pair<std::string, float>> process = {

@@ -3,7 +3,8 @@
 
 // The road of one frame, for real: a heap allocator makes each frame's
 // image (heap buffers, each with a software fence); a producer thread writes every plane of each
-// frame through Image::MappedImage and signals the image's fences; a consumer thread waits on the
+// frame through Image::MappedImage (a test picture with a progress bar where the layout holds
+// samples, a pattern elsewhere) and signals the image's fences; a consumer thread waits on the
 // image, maps it and verifies a checksum of every plane. The run is reported to the camera latency
 // analyzer, which writes a ".cpa" file.
 
@@ -27,6 +28,9 @@ struct DemoOptions {
   std::string out_dir = "orvex-out";
   // Stream for the progress line ("\rframe i/n"), or null for none.
   std::ostream* progress = nullptr;
+  // When set, the last frame's buffers are written into this directory
+  // (made if missing), one file per buffer, as `orvex render` reads them.
+  std::string dump_dir;
   // Test hook: the producer changes one byte of this frame after computing
   // its checksums, so the consumer must report the frame as corrupt.
   std::optional<int> corrupt_frame;
@@ -43,6 +47,7 @@ struct DemoReport {
   absl::Duration elapsed;                      // first allocation to last verification
   std::vector<absl::Duration> wake_latencies;  // producer signal to consumer wake
   std::string cpa_path;                        // the file the analyzer wrote
+  std::vector<std::string> dump_files;         // the last frame's buffers, when dumped
 };
 
 // Runs the pipeline. Errors (returned, nothing printed): the ImageFormat

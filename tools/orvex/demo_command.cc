@@ -4,6 +4,7 @@
 #include <cstring>
 #include <ostream>
 
+#include "absl/strings/str_join.h"
 #include "fmt/format.h"
 #include "host_trace/host_trace.h"
 #include "orvex/api/debug/perf_trace.h"
@@ -41,6 +42,12 @@ std::string PrintReport(const DemoOptions& options, const DemoReport& report) {
                       absl::ToDoubleMilliseconds(Percentile(report.wake_latencies, 0.99)));
   text += fmt::format("latency profile: {}\n  read it back with: orvex cpa {}\n", report.cpa_path,
                       report.cpa_path);
+  if (!report.dump_files.empty()) {
+    const std::string files = absl::StrJoin(report.dump_files, " ");
+    text += fmt::format("last frame: {}\n  render it with: orvex render {} {} {} {} -o {}.png\n",
+                        files, options.size.width, options.size.height, report.format_name, files,
+                        options.dump_dir + "/last-frame");
+  }
   return text;
 }
 
@@ -64,6 +71,10 @@ int RunDemoCommand(const ParsedArgs& args, CommandContext& context) {
   if (auto text = args.Get("out")) {
     if (text->empty()) return context.UsageError("--out must name a directory");
     options.out_dir = *text;
+  }
+  if (auto text = args.Get("dump")) {
+    if (text->empty()) return context.UsageError("--dump must name a directory");
+    options.dump_dir = *text;
   }
   if (context.terminal()) options.progress = &context.err();
 
@@ -110,14 +121,17 @@ const Command& DemoCommand() {
            "signals its fences; a consumer thread waits, maps the image and verifies a\n"
            "checksum of every plane. Prints frames processed, the verification result,\n"
            "throughput and the producer-signal-to-consumer-wake latency, and has the\n"
-           "latency analyzer write a .cpa file into the output directory. Exit status 1\n"
-           "when a frame fails verification, 2 when the trace cannot be written in full.\n\n"
+           "latency analyzer write a .cpa file into the output directory. Frames of a\n"
+           "layout that holds samples show colour bars and a progress bar; --dump writes\n"
+           "the last one for 'orvex render'. Exit status 1 when a frame fails\n"
+           "verification, 2 when the trace cannot be written in full.\n\n"
            "example: orvex demo --size 1920x1080 --format YCBCR_P010 --frames 60 --trace t.json",
        .flags = {{"size", "WxH", "frame size (default 4000x3000)"},
                  {"format", "NAME", "pixel format, name or code (default YCBCR_420_888)"},
                  {"frames", "N", "number of frames, 1 to 100000 (default 30)"},
                  {"out", "DIR", "directory for the .cpa file (default ./orvex-out)"},
-                 {"trace", "FILE", "record a trace (JSON, for the Perfetto UI) into FILE"}}},
+                 {"trace", "FILE", "record a trace (JSON, for the Perfetto UI) into FILE"},
+                 {"dump", "DIR", "write the last frame's buffers into DIR for 'orvex render'"}}},
       RunDemoCommand};
   return command;
 }

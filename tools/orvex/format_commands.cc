@@ -134,19 +134,8 @@ std::string LayoutText(const ImageFormat& format) {
 }
 
 int RunLayout(const ParsedArgs& args, CommandContext& context) {
-  constexpr int64_t kMaxDimension = std::numeric_limits<int>::max();
-  auto width = ParseInteger(args.positionals[0], "WIDTH", 1, kMaxDimension);
-  if (!width.ok()) return context.UsageError(width.status().message());
-  auto height = ParseInteger(args.positionals[1], "HEIGHT", 1, kMaxDimension);
-  if (!height.ok()) return context.UsageError(height.status().message());
-  auto pixel_format = ParseHalPixelFormat(args.positionals[2], "FORMAT");
-  if (!pixel_format.ok()) return context.UsageError(pixel_format.status().message());
-  std::optional<ImageFormat::InterleavedChromaOrder> order;
-  if (auto text = args.Get("order")) {
-    auto parsed = ParseChromaOrder(*text);
-    if (!parsed.ok()) return context.UsageError(parsed.status().message());
-    order = *parsed;
-  }
+  auto layout = ParseLayoutArgs(args);
+  if (!layout.ok()) return context.UsageError(layout.status().message());
   std::optional<HalPixelFormat> target;
   if (auto text = args.Get("conform")) {
     auto parsed = ParseHalPixelFormat(*text, "--conform TARGET");
@@ -154,8 +143,7 @@ int RunLayout(const ParsedArgs& args, CommandContext& context) {
     target = *parsed;
   }
 
-  auto format =
-      ImageFormat::Make(static_cast<int>(*width), static_cast<int>(*height), *pixel_format, order);
+  auto format = ImageFormat::Make(layout->width, layout->height, layout->format, layout->order);
   if (!format.ok()) return context.Error(format.status());
 
   // INVALID_ARGUMENT is the answer "does not conform"; a target that cannot

@@ -2,6 +2,7 @@
 
 #include <array>
 #include <cctype>
+#include <limits>
 #include <string>
 
 #include "fmt/format.h"
@@ -95,6 +96,20 @@ orvex::StatusOr<orvex::ImageFormat::InterleavedChromaOrder> ParseChromaOrder(
     }
   }
   return orvex::InvalidArgumentError(fmt::format("--order must be CbCr or CrCb, got '{}'", text));
+}
+
+orvex::StatusOr<LayoutArgs> ParseLayoutArgs(const ParsedArgs& args) {
+  constexpr int64_t kMaxDimension = std::numeric_limits<int>::max();
+  ORVEX_ASSIGN_OR_RETURN(int64_t width,
+                         ParseInteger(args.positionals[0], "WIDTH", 1, kMaxDimension));
+  ORVEX_ASSIGN_OR_RETURN(int64_t height,
+                         ParseInteger(args.positionals[1], "HEIGHT", 1, kMaxDimension));
+  ORVEX_ASSIGN_OR_RETURN(HalPixelFormat format, ParseHalPixelFormat(args.positionals[2], "FORMAT"));
+  LayoutArgs parsed = {static_cast<int>(width), static_cast<int>(height), format, std::nullopt};
+  if (auto text = args.Get("order")) {
+    ORVEX_ASSIGN_OR_RETURN(parsed.order, ParseChromaOrder(*text));
+  }
+  return parsed;
 }
 
 std::string HexCode(HalPixelFormat format) {

@@ -4,12 +4,14 @@
 // The HAL pixel formats the library knows, in code order, and the reading of
 // a format or chroma order given on the command line.
 
+#include <optional>
 #include <span>
 #include <string_view>
 
 #include "orvex/api/memory/hal_pixel_format.h"
 #include "orvex/api/memory/image_format.h"
 #include "orvex/status/statusor.h"
+#include "tools/orvex/args.h"
 
 namespace orvex_tool {
 
@@ -23,6 +25,17 @@ orvex::StatusOr<orvex::HalPixelFormat> ParseHalPixelFormat(std::string_view text
 
 // "CbCr" or "CrCb" (any letter case).
 orvex::StatusOr<orvex::ImageFormat::InterleavedChromaOrder> ParseChromaOrder(std::string_view text);
+
+// WIDTH HEIGHT FORMAT (the first three positional arguments) and --order, as
+// the layout commands take them; INVALID_ARGUMENT with the text for the
+// usage error.
+struct LayoutArgs {
+  int width;
+  int height;
+  orvex::HalPixelFormat format;
+  std::optional<orvex::ImageFormat::InterleavedChromaOrder> order;
+};
+orvex::StatusOr<LayoutArgs> ParseLayoutArgs(const ParsedArgs& args);
 
 // "0x23" style text of a code.
 std::string HexCode(orvex::HalPixelFormat format);

@@ -1,5 +1,7 @@
 #include "tools/orvex/json.h"
 
+#include <cmath>
+
 #include "fmt/format.h"
 #include "orvex/status/log.h"
 
@@ -64,6 +66,8 @@ void Json::DumpTo(std::string& out, int indent) const {
     out += fmt::format("{}", *i);
   } else if (const uint64_t* u = std::get_if<uint64_t>(&value_)) {
     out += fmt::format("{}", *u);
+  } else if (const double* d = std::get_if<double>(&value_)) {
+    out += std::isfinite(*d) ? fmt::format("{}", *d) : "null";
   } else if (const std::string* s = std::get_if<std::string>(&value_)) {
     out += JsonQuote(*s);
   } else if (const Array* a = std::get_if<Array>(&value_)) {

@@ -2,7 +2,8 @@
 #define ORVEX_TOOLS_ORVEX_JSON_H_
 
 // A small JSON document builder for the tool's --json outputs: null, bool,
-// integers, strings, arrays and objects that keep their keys in insertion
+// integers, numbers (shortest text that reads back exactly; null when not
+// finite), strings, arrays and objects that keep their keys in insertion
 // order (so the printed shape is fixed).
 //
 // Printing: two-space indentation; a container that holds no container is
@@ -28,6 +29,7 @@ class Json {
   Json(int value) : value_(int64_t{value}) {}              // NOLINT(google-explicit-constructor)
   Json(int64_t value) : value_(value) {}                   // NOLINT(google-explicit-constructor)
   Json(uint64_t value) : value_(value) {}                  // NOLINT(google-explicit-constructor)
+  Json(double value) : value_(value) {}                    // NOLINT(google-explicit-constructor)
   Json(std::string value) : value_(std::move(value)) {}    // NOLINT(google-explicit-constructor)
   Json(const char* value) : value_(std::string(value)) {}  // NOLINT(google-explicit-constructor)
 
@@ -49,7 +51,7 @@ class Json {
   bool IsContainer() const;
   void DumpTo(std::string& out, int indent) const;
 
-  std::variant<std::monostate, bool, int64_t, uint64_t, std::string, Array, Object> value_;
+  std::variant<std::monostate, bool, int64_t, uint64_t, double, std::string, Array, Object> value_;
 };
 
 // `text` as a JSON string literal, quotes included.

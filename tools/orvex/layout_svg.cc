@@ -148,11 +148,15 @@ std::string LayoutSvg(const ImageFormat& format) {
   }
   y += 12;
   const int width = kLeft * 2 + static_cast<int>(kBarLength) + 200;
+  return SvgDocument(width, y, body);
+}
+
+std::string SvgDocument(int width, int height, std::string_view body) {
   return fmt::format(
       "<svg xmlns=\"http://www.w3.org/2000/svg\" width=\"{}\" height=\"{}\" viewBox=\"0 0 {} {}\" "
       "font-family=\"sans-serif\">\n"
       "<rect width=\"100%\" height=\"100%\" fill=\"white\"/>\n{}</svg>\n",
-      width, y, width, y, body);
+      width, height, width, height, body);
 }
 
 }  // namespace orvex_tool

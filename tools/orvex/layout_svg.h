@@ -16,6 +16,10 @@ namespace orvex_tool {
 // A standalone SVG document.
 std::string LayoutSvg(const orvex::ImageFormat& format);
 
+// A standalone SVG document of the given size on a white background around
+// `body` (SVG elements).
+std::string SvgDocument(int width, int height, std::string_view body);
+
 // `text` with the XML special characters escaped.
 std::string XmlEscape(std::string_view text);
 

@@ -1,7 +1,9 @@
 // In-process tests of the orvex tool: argument parsing, output shapes and
-// error paths of every command.
+// error paths of every command; pictures written into layouts, rendered to
+// PNG and read back.
 
 #include <fcntl.h>
+#include <png.h>
 #include <signal.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
@@ -16,17 +18,24 @@
 #include <thread>
 #include <vector>
 
+#include "absl/strings/ascii.h"
+#include "absl/strings/str_split.h"
+#include "cutils/properties.h"
+#include "expat.h"
 #include "gmock/gmock.h"
 #include "google/protobuf/util/json_util.h"
 #include "gtest/gtest.h"
+#include "orvex/api/debug/camera_latency_analyzer.h"
 #include "orvex/api/debug/camera_performance_analyzer.pb.h"
 #include "orvex/api/memory/hal_pixel_format.h"
 #include "orvex/status/status_matchers.h"
 #include "tools/orvex/args.h"
+#include "tools/orvex/cpa.h"
 #include "tools/orvex/demo.h"
 #include "tools/orvex/format_names.h"
 #include "tools/orvex/json.h"
 #include "tools/orvex/layout_svg.h"
+#include "tools/orvex/render.h"
 #include "tools/orvex/table.h"
 #include "tools/orvex/tool.h"
 
@@ -94,6 +103,7 @@ class ScratchDir {
     if (!path_.empty()) std::filesystem::remove_all(path_, ignored);
   }
   const std::string& path() const { return path_; }
+  std::string File(const std::string& name) const { return path_ + "/" + name; }
 
  private:
   std::string path_;
@@ -116,7 +126,7 @@ const CommandSpec& TestSpec() {
       .positional_count = 2,
       .summary = "a test command",
       .details = "",
-      .flags = {{"json", "", "json output"}, {"out", "DIR", "output directory"}}};
+      .flags = {{"json", "", "json output"}, {"out", "DIR", "output directory", 'o'}}};
   return spec;
 }
 
@@ -134,6 +144,7 @@ TEST(ArgsTest, AcceptsFlagShapes) {
       {{"a", "--", "--json"}, {"a", "--json"}, "", false},
       {{"-5", "-0x10"}, {"-5", "-0x10"}, "", false},
       {{"a", "b", "--out="}, {"a", "b"}, "", false},
+      {{"a", "-o", "d", "b"}, {"a", "b"}, "d", false},
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(::testing::PrintToString(c.args));
@@ -173,8 +184,8 @@ TEST(ArgsTest, HelpSkipsThePositionalCount) {
   EXPECT_TRUE(parsed->help);
   EXPECT_THAT(UsageText(TestSpec()),
               AllOf(StartsWith("usage: orvex test A B [flags]\n\na test command\n"),
-                    HasSubstr("  --out DIR   output directory\n"),
-                    HasSubstr("  -h, --help  print this help and exit\n")));
+                    HasSubstr("  -o, --out DIR  output directory\n"),
+                    HasSubstr("  -h, --help     print this help and exit\n")));
 }
 
 TEST(ArgsTest, ParsesNumbers) {
@@ -282,8 +293,8 @@ TEST(ToolTest, TopLevelUsageAndUnknownCommand) {
 }
 
 TEST(ToolTest, EveryCommandHasHelp) {
-  for (const Command* command :
-       {&DemoCommand(), &FormatsCommand(), &LayoutCommand(), &PyramidCommand(), &CpaCommand()}) {
+  for (const Command* command : {&DemoCommand(), &FormatsCommand(), &LayoutCommand(),
+                                 &RenderCommand(), &PyramidCommand(), &CpaCommand()}) {
     const std::string name(command->spec.name);
     SCOPED_TRACE(name);
     RunResult result = RunOrvex({name, "--help"});
@@ -683,10 +694,6 @@ TEST(CpaTest, UnreadableAndCorruptFilesAreErrors) {
   EXPECT_EQ(absent.code, kExitError);
   EXPECT_EQ(absent.err, "NOT_FOUND: cannot open " + missing + ": No such file or directory\n");
 
-  RunResult directory = RunOrvex({"cpa", dir.path()});
-  EXPECT_EQ(directory.code, kExitError);
-  EXPECT_EQ(directory.err, "FAILED_PRECONDITION: cannot read " + dir.path() + ": Is a directory\n");
-
   struct Case {
     std::string name;
     std::string bytes;
@@ -713,6 +720,115 @@ TEST(CpaTest, UnreadableAndCorruptFilesAreErrors) {
                                 std::to_string(c.bytes.size()) + " bytes)\n");
     }
   }
+}
+
+TEST(CpaTest, HostileInputIsBoundedAndEscaped) {
+  ScratchDir dir;
+  // Far over 2 GiB: refused before anything is read (sparse, no disk used).
+  const std::string huge = dir.path() + "/huge.cpa";
+  WriteFile(huge, "");
+  ASSERT_EQ(truncate(huge.c_str(), off_t{3} << 30), 0);
+  ExpectErrors({{{"cpa", huge},
+                 "INVALID_ARGUMENT: " + huge +
+                     " is 3221225472 bytes, more than the 2147483647 a .cpa file can hold\n"}});
+  // A device that never ends is parsed as it is read: its first byte ends it.
+  RunResult zero = RunOrvex({"cpa", "/dev/zero"});
+  EXPECT_EQ(zero.code, kExitError);
+  EXPECT_THAT(zero.err, StartsWith("INVALID_ARGUMENT: /dev/zero is not a valid .cpa file"));
+  // A stream of valid records is cut off at the limit.
+  int fds[2];
+  ASSERT_EQ(pipe(fds), 0);
+  std::string records;
+  for (int i = 0; i < 50; ++i) records += std::string("\x1a\x00", 2);  // empty latency data
+  ASSERT_EQ(write(fds[1], records.data(), records.size()), static_cast<ssize_t>(records.size()));
+  close(fds[1]);
+  const std::string stream = "/dev/fd/" + std::to_string(fds[0]);
+  EXPECT_THAT(ReadCpaFile(stream, 64).status(),
+              StatusIs(orvex::StatusCode::kInvalidArgument,
+                       stream + " goes on past 64 bytes, more than a .cpa file can hold"));
+  EXPECT_THAT(ReadCpaFile(stream, 200).status(), IsOk());  // the rest of it, within the limit
+  close(fds[0]);
+
+  // Names cannot drive the terminal: control characters print escaped.
+  orvex::CameraPerformanceDataFile file;
+  orvex::CameraLatencyData* operation = file.add_camera_latency_data();
+  operation->set_operation_case("\x1b]0;owned\x07Open");
+  operation->add_latency_data()->set_event_name(std::string("A\0B\xc2\x9b\\", 6));
+  const std::string path = dir.path() + "/names.cpa";
+  WriteFile(path, file.SerializeAsString());
+  for (const std::vector<std::string>& args :
+       {std::vector<std::string>{"cpa", path}, std::vector<std::string>{"cpa", path, path}}) {
+    SCOPED_TRACE(args.size());
+    RunResult result = RunOrvex(args);
+    EXPECT_EQ(result.code, kExitOk) << result.err;
+    EXPECT_THAT(result.out,
+                AllOf(HasSubstr("\\x1b]0;owned\\x07Open"), HasSubstr("A\\x00B\\u009b\\\\")));
+    EXPECT_EQ(result.out.find_first_of(std::string("\x1b\x07\0", 3)), std::string::npos);
+  }
+}
+
+// Counts the points of a chart; false when it is not well-formed XML.
+bool CountPoints(const std::string& svg, int& points, int& slow) {
+  struct Counts {
+    int& points;
+    int& slow;
+  } counts{points, slow};
+  XML_Parser parser = XML_ParserCreate(nullptr);
+  XML_SetUserData(parser, &counts);
+  XML_SetStartElementHandler(parser, [](void* data, const XML_Char* name, const XML_Char** attrs) {
+    if (std::string_view(name) != "circle") return;
+    auto* c = static_cast<Counts*>(data);
+    ++c->points;
+    for (int i = 0; attrs[i] != nullptr; i += 2) {
+      if (std::string_view(attrs[i]) == "fill" && std::string_view(attrs[i + 1]) == "#c0392b") {
+        ++c->slow;
+      }
+    }
+  });
+  const bool parsed =
+      XML_Parse(parser, svg.data(), static_cast<int>(svg.size()), /*isFinal=*/1) == XML_STATUS_OK;
+  XML_ParserFree(parser);
+  return parsed;
+}
+
+TEST(CpaTest, ManySessionsWrittenByTheAnalyzer) {
+  ScratchDir dir;
+  orvex::CameraLatencyAnalyzer& analyzer = orvex::CameraLatencyAnalyzer::GetAnalyzer();
+  analyzer.SetOutputDirectory(dir.path());
+  ASSERT_EQ(property_set(orvex::kCameraPerformanceAnalyzerWriteToDiskProperty, "true"), 0);
+  for (float open_ms : {100.0f, 350.0f, 200.0f}) {
+    analyzer.InjectEvent("Camera-Open", {{"Overall", open_ms}, {"SensorPowerUp", 40.0f}});
+    analyzer.InjectEvent("Camera-Close", {{"Overall", 50.0f}});
+  }
+  const std::string bad = dir.path() + "/bad.cpa";
+  WriteFile(bad, "this is not a profile\n");
+  const std::string svg = dir.path() + "/chart.svg";
+
+  RunResult text = RunOrvex({"cpa", dir.path(), "--svg", svg});
+  EXPECT_EQ(text.code, kExitError);
+  EXPECT_EQ(text.err, "skipped: INVALID_ARGUMENT: " + bad +
+                          " is not a valid .cpa file: it does not parse as a "
+                          "CameraPerformanceDataFile message (22 bytes)\n");
+  EXPECT_THAT(text.out,
+              AllOf(StartsWith("3 sessions, "),
+                    HasSubstr("\nCamera-Open (3 sessions, threshold 300 ms: 1 over)\n"
+                              "EVENT          COUNT  MIN (ms)  MEDIAN (ms)  P90 (ms)  MAX (ms)\n"
+                              "Overall            3   100.000      200.000   350.000   350.000\n"
+                              "SensorPowerUp      3    40.000       40.000    40.000    40.000\n"),
+                    HasSubstr("\nCamera-Close (3 sessions, threshold 250 ms: 0 over)\n")));
+  // Sessions in time order: only the second one was slow.
+  EXPECT_THAT(text.out, testing::ContainsRegex("\nsessions in time order:\nTIME +FILE +OPERATIONS "
+                                               "+OVER THRESHOLD\n[^\n]+  2  -\n[^\n]+  2  "
+                                               "Camera-Open\n[^\n]+  2  -\n$"));
+  int points = 0, slow = 0;
+  EXPECT_TRUE(CountPoints(ReadFile(svg), points, slow));
+  EXPECT_EQ(points, 6);  // a point per session for each of the two operations
+  EXPECT_EQ(slow, 1);
+
+  RunResult json = RunOrvex({"cpa", dir.path() + "/", "--json"});
+  EXPECT_EQ(json.code, kExitError);
+  EXPECT_THAT(json.out, HasSubstr("{\"event\": \"Overall\", \"count\": 3, \"min_ms\": 100, "
+                                  "\"median_ms\": 200, \"p90_ms\": 350, \"max_ms\": 350}"));
 }
 
 }  // namespace
@@ -885,6 +1001,337 @@ TEST(DemoTest, Errors) {
        "NOT_FOUND: cannot trace into " + dir.path() +
            "/no/trace.json: No such file or directory\n"},
   });
+}
+
+using orvex::HalPixelFormat;
+
+// The PNG at `path` as RGB; an empty picture when it does not read.
+Picture ReadPng(const std::string& path) {
+  png_image image = {};
+  image.version = PNG_IMAGE_VERSION;
+  Picture picture;
+  if (png_image_begin_read_from_file(&image, path.c_str()) == 0) return picture;
+  image.format = PNG_FORMAT_RGB;
+  picture.pixels.resize(PNG_IMAGE_SIZE(image));
+  if (png_image_finish_read(&image, nullptr, picture.pixels.data(), 0, nullptr) == 0) {
+    return {};
+  }
+  picture.width = static_cast<int>(image.width);
+  picture.height = static_cast<int>(image.height);
+  return picture;
+}
+
+Rgb At(const Picture& p, int x, int y) {
+  const size_t i = (static_cast<size_t>(y) * p.width + x) * 3;
+  return {p.pixels[i], p.pixels[i + 1], p.pixels[i + 2]};
+}
+
+bool Near(Rgb a, Rgb b, int tolerance) {
+  return std::abs(a.r - b.r) <= tolerance && std::abs(a.g - b.g) <= tolerance &&
+         std::abs(a.b - b.b) <= tolerance;
+}
+
+struct Pixel {
+  int x, y;
+  Rgb rgb;
+};
+
+// Colours constant over 2x2 blocks, so that subsampled chroma keeps them.
+Rgb BlockColor(int x, int y) {
+  static constexpr Rgb kPalette[] = {{200, 30, 40}, {20, 180, 60},   {30, 50, 210}, {240, 240, 20},
+                                     {90, 90, 90},  {250, 250, 250}, {10, 10, 10},  {120, 40, 200}};
+  return kPalette[(x / 2 + 3 * (y / 2)) % 8];
+}
+
+// Writes `buffers` as the dump files: one per buffer, or back to back in one.
+std::vector<std::string> WriteDump(const ScratchDir& scratch,
+                                   const std::vector<std::string>& buffers, bool one_file) {
+  if (one_file) {
+    std::string all;
+    for (const std::string& b : buffers) all += b;
+    WriteFile(scratch.File("dump.raw"), all);
+    return {scratch.File("dump.raw")};
+  }
+  std::vector<std::string> files;
+  for (size_t i = 0; i < buffers.size(); ++i) {
+    files.push_back(scratch.File("buffer" + std::to_string(i) + ".raw"));
+    WriteFile(files.back(), buffers[i]);
+  }
+  return files;
+}
+
+// Renders `buffers` with `flags`; the picture read back from the PNG.
+Picture Render(const ScratchDir& scratch, const orvex::ImageFormat& format,
+               const std::vector<std::string>& buffers, const std::vector<std::string>& flags,
+               bool one_file) {
+  std::vector<std::string> args = {"render", std::to_string(format.width()),
+                                   std::to_string(format.height()),
+                                   orvex::FormatToString(format.format())};
+  for (const std::string& file : WriteDump(scratch, buffers, one_file)) args.push_back(file);
+  args.insert(args.end(), {"-o", scratch.File("out.png")});
+  args.insert(args.end(), flags.begin(), flags.end());
+  const RunResult result = RunOrvex(args);
+  EXPECT_EQ(result.code, kExitOk) << result.err;
+  return ReadPng(scratch.File("out.png"));
+}
+
+TEST(RenderTest, PicturesRoundTripThroughEveryFamily) {
+  using orvex::ColorFilterArrangement;
+  enum class Shows { kColor, kLuma, kMosaic, kDemosaic };
+  struct Case {
+    HalPixelFormat format;
+    int width, height;
+    Shows shows;
+    std::vector<std::string> flags = {};
+    ColorFilterArrangement cfa = ColorFilterArrangement::kRggb;
+  };
+  const Case cases[] = {
+      {HalPixelFormat::YCBCR_420_888, 6, 6, Shows::kColor},  // chroma 3x3
+      {HalPixelFormat::YCBCR_420_888, 8, 4, Shows::kColor, {"--order", "CbCr"}},
+      {HalPixelFormat::YCBCR_420_888_STRIDE_ALIGNED_64, 20, 4, Shows::kColor},  // row padding
+      {HalPixelFormat::YCBCR_P010, 8, 4, Shows::kColor},
+      {HalPixelFormat::YCBCR_420_SP_M_S10B, 12, 4, Shows::kColor},
+      {HalPixelFormat::YV12, 8, 6, Shows::kColor},
+      {HalPixelFormat::YCBCR_422_I, 6, 5, Shows::kColor},  // odd height
+      {HalPixelFormat::Y8, 6, 4, Shows::kLuma},
+      {HalPixelFormat::Y16, 6, 4, Shows::kLuma},
+      {HalPixelFormat::Y10, 6, 4, Shows::kLuma},  // a row ends inside a packed group
+      {HalPixelFormat::RAW10, 8, 3, Shows::kMosaic},
+      {HalPixelFormat::RAW12, 8, 2, Shows::kMosaic},
+      {HalPixelFormat::RAW16, 6, 4, Shows::kMosaic, {}, ColorFilterArrangement::kBggr},
+      {HalPixelFormat::RAW10,
+       8,
+       5,
+       Shows::kDemosaic,
+       {"--demosaic", "--cfa", "grbg"},
+       ColorFilterArrangement::kGrbg},
+  };
+  int run = 0;
+  for (const Case& c : cases) {
+    SCOPED_TRACE(orvex::FormatToString(c.format) + " " + std::to_string(c.width) + "x" +
+                 std::to_string(c.height));
+    using Order = orvex::ImageFormat::InterleavedChromaOrder;
+    const bool cbcr = !c.flags.empty() && c.flags[0] == "--order";
+    auto format = orvex::ImageFormat::Make(c.width, c.height, c.format,
+                                           cbcr ? std::optional(Order::kCbCr) : std::nullopt);
+    ASSERT_TRUE(format.ok()) << format.status();
+    // Bytes outside the samples hold garbage that must not show.
+    std::vector<std::string> buffers;
+    std::vector<std::span<uint8_t>> spans;
+    for (size_t size : format->buffer_sizes()) buffers.emplace_back(size, '\x5a');
+    for (std::string& b : buffers)
+      spans.emplace_back(reinterpret_cast<uint8_t*>(b.data()), b.size());
+    DrawPicture(
+        *format, spans,
+        [](int y, std::span<Rgb> row) {
+          for (size_t x = 0; x < row.size(); ++x) row[x] = BlockColor(static_cast<int>(x), y);
+        },
+        0, c.height, c.cfa);
+    ScratchDir scratch;
+    const Picture picture = Render(scratch, *format, buffers, c.flags, ++run % 2 == 0);
+    const bool half = c.shows == Shows::kDemosaic;
+    ASSERT_EQ(picture.width, half ? c.width / 2 : c.width);
+    ASSERT_EQ(picture.height, half ? c.height / 2 : c.height);
+    const std::string sites = absl::AsciiStrToUpper(orvex::ColorFilterArrangementToString(c.cfa));
+    int wrong = 0;
+    for (int y = 0; y < picture.height; ++y) {
+      for (int x = 0; x < picture.width; ++x) {
+        Rgb want = BlockColor(half ? 2 * x : x, half ? 2 * y : y);
+        int tolerance = 0;
+        if (c.shows == Shows::kColor) tolerance = 3;  // 8-bit YUV rounding
+        if (c.shows == Shows::kLuma) {
+          const auto luma =
+              static_cast<uint8_t>(std::lround(0.299 * want.r + 0.587 * want.g + 0.114 * want.b));
+          want = {luma, luma, luma};
+          tolerance = 1;
+        }
+        if (c.shows == Shows::kMosaic) {
+          const char site = sites[(y % 2) * 2 + x % 2];
+          const uint8_t v = site == 'R' ? want.r : site == 'B' ? want.b : want.g;
+          want = {v, v, v};
+        }
+        const Rgb got = At(picture, x, y);
+        if (!Near(got, want, tolerance) && wrong++ == 0) {
+          ADD_FAILURE() << "pixel " << x << "," << y << ": got " << int{got.r} << " " << int{got.g}
+                        << " " << int{got.b} << ", want " << int{want.r} << " " << int{want.g}
+                        << " " << int{want.b};
+        }
+      }
+    }
+    EXPECT_EQ(wrong, 0);
+  }
+}
+
+// Bytes written by hand: sample packing, byte order, chroma order, range and
+// matrix, independent of the picture writer.
+TEST(RenderTest, KnownBytesGiveKnownColours) {
+  struct Patch {
+    size_t buffer;
+    size_t offset;
+    std::string bytes;
+  };
+  struct Case {
+    std::string name;
+    HalPixelFormat format;
+    int width, height;
+    std::vector<std::string> flags;
+    std::vector<Patch> patches;
+    std::vector<Pixel> want;
+  };
+  const std::string y76 = "\x4c\x4c";
+  const Case cases[] = {
+      {"NV21 red",
+       HalPixelFormat::YCBCR_420_888,
+       2,
+       2,
+       {},
+       {{0, 0, y76}, {0, 16, y76}, {1, 0, "\xff\x55"}},
+       {{1, 1, {254, 0, 0}}}},
+      {"CbCr order",
+       HalPixelFormat::YCBCR_420_888,
+       2,
+       2,
+       {"--order", "cbcr"},
+       {{0, 0, y76}, {0, 16, y76}, {1, 0, "\xff\x55"}},
+       {{0, 0, {16, 63, 255}}}},
+      {"limited range",
+       HalPixelFormat::YCBCR_420_888,
+       2,
+       2,
+       {"--range", "limited"},
+       {{0, 0, "\xeb\x10"}, {1, 0, "\x80\x80"}},
+       {{0, 0, {255, 255, 255}}, {1, 0, {0, 0, 0}}}},
+      {"BT.709",
+       HalPixelFormat::YCBCR_420_888,
+       2,
+       2,
+       {"--matrix", "BT709"},
+       {{0, 0, "\x80"}, {1, 0, "\xc8\x80"}},
+       {{0, 0, {241, 94, 128}}}},
+      {"P010 words",
+       HalPixelFormat::YCBCR_P010,
+       2,
+       2,
+       {},
+       {{0, 0, "\xc0\xff"}, {0, 32, std::string("\x00\x80\x00\x80", 4)}},
+       {{0, 0, {255, 255, 255}}}},
+      {"Y16 word",
+       HalPixelFormat::Y16,
+       2,
+       2,
+       {},
+       {{0, 0, std::string("\xff\x80", 2)}},
+       {{0, 0, {128, 128, 128}}}},
+      {"RAW10 group",
+       HalPixelFormat::RAW10,
+       4,
+       1,
+       {},
+       {{0, 0, "\x10\x20\x30\x40\xff"}},
+       {{0, 0, {16, 16, 16}}, {3, 0, {64, 64, 64}}}},
+      {"RAW12 groups",
+       HalPixelFormat::RAW12,
+       4,
+       1,
+       {},
+       {{0, 0, "\x10\x20\xff\x30\x40\xff"}},
+       {{2, 0, {48, 48, 48}}, {3, 0, {64, 64, 64}}}},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.name);
+    auto format = orvex::ImageFormat::Make(c.width, c.height, c.format);
+    ASSERT_TRUE(format.ok()) << format.status();
+    std::vector<std::string> buffers;
+    for (size_t size : format->buffer_sizes()) buffers.emplace_back(size, '\0');
+    for (const Patch& p : c.patches) buffers[p.buffer].replace(p.offset, p.bytes.size(), p.bytes);
+    ScratchDir scratch;
+    const Picture picture = Render(scratch, *format, buffers, c.flags, false);
+    ASSERT_EQ(picture.width, c.width);
+    for (const Pixel& p : c.want) {
+      const Rgb got = At(picture, p.x, p.y);
+      EXPECT_TRUE(Near(got, p.rgb, 1))
+          << p.x << "," << p.y << ": " << int{got.r} << " " << int{got.g} << " " << int{got.b};
+    }
+  }
+}
+
+TEST(RenderTest, RefusesBadInputAndLeavesNoPng) {
+  ScratchDir scratch;
+  const std::string short_dump = scratch.File("short.raw");
+  const std::string long_dump = scratch.File("long.raw");
+  WriteFile(short_dump, std::string(3000, '\0'));
+  WriteFile(long_dump, std::string(3073, '\0'));
+  const std::string dump = scratch.File("ok.raw");  // YV12 or YCBCR_420_888 64x32
+  WriteFile(dump, std::string(3072, '\0'));
+  const std::string out = scratch.File("out.png");
+  const std::string usage = "\nRun 'orvex render --help' for usage.\n";
+  std::vector<ErrorCase> cases = {
+      {{"64", "32", "YV12", short_dump, "-o", out},
+       "INVALID_ARGUMENT: " + short_dump +
+           ": expected 3072 bytes (buffer 0 of YV12 64x32), found 3000\n"},
+      {{"64", "32", "YCBCR_420_888", long_dump, "-o", out},
+       "INVALID_ARGUMENT: " + long_dump +
+           ": expected 3072 bytes (the 2 buffers of YCBCR_420_888 64x32 back to back: 2048 + "
+           "1024), found 3073\n"},
+      {{"64", "32", "YCBCR_420_888", "/dev/zero", "-o", out},
+       "INVALID_ARGUMENT: /dev/zero: expected 3072 bytes (the 2 buffers of YCBCR_420_888 64x32 "
+       "back to back: 2048 + 1024), found more\n"},
+      {{"64", "32", "YCBCR_420_888", short_dump, short_dump, short_dump, "-o", out},
+       "INVALID_ARGUMENT: YCBCR_420_888 64x32 has 2 buffers: give one file per buffer, or one "
+       "file with the buffers back to back; got 3 files\n"},
+      {{"64", "32", "Y8", scratch.File("none.raw"), "-o", out},
+       "NOT_FOUND: cannot open " + scratch.File("none.raw") + ": No such file or directory\n"},
+      {{"64", "32", "YCBCR_420_SP_M_SBWC", short_dump, "-o", out},
+       "UNIMPLEMENTED: YCBCR_420_SP_M_SBWC is an SBWC-compressed layout and render has no SBWC "
+       "decoder for its payload; dump the image uncompressed (YCBCR_420_888) and render that\n"},
+      {{"64", "32", "YCBCR_420_888_AFBC_EXTRAWIDEBLK", short_dump, "-o", out},
+       "UNIMPLEMENTED: YCBCR_420_888_AFBC_EXTRAWIDEBLK is an AFBC-compressed layout and render "
+       "has no AFBC decoder for its payload\n"},
+      {{"64", "32", "BLOB", short_dump, "-o", out},
+       "UNIMPLEMENTED: BLOB holds no samples render can show (it needs luma and chroma, luma "
+       "alone, or a Bayer mosaic): a BLOB is encoded data, not samples\n"},
+      {{"64", "32", "YV12", dump, "-o", out, "--demosaic"},
+       "INVALID_ARGUMENT: --demosaic needs a Bayer layout; YV12 is none\n"},
+      {{"64", "32", "YV12", dump, "-o", scratch.File("no/out.png")},
+       "NOT_FOUND: cannot write " + scratch.File("no/out.png") + ": No such file or directory\n"},
+      {{"64", "32", "YV12", long_dump}, "orvex render: -o OUT.png is required" + usage},
+      {{"64", "32", "YV12", long_dump, "-o", out, "--range", "tv"},
+       "orvex render: --range must be full or limited, got 'tv'" + usage},
+      {{"64", "32", "YV12", "-o", out},
+       "orvex render: expected at least 4 arguments (WIDTH HEIGHT FORMAT FILE...), got 3" + usage},
+  };
+  for (ErrorCase& c : cases) c.args.insert(c.args.begin(), "render");
+  ExpectErrors(cases);
+  // Nothing but the inputs is left: no PNG, no temporary file.
+  std::vector<std::string> left;
+  for (const auto& entry : std::filesystem::directory_iterator(scratch.path())) {
+    left.push_back(entry.path().filename().string());
+  }
+  EXPECT_THAT(left, ::testing::UnorderedElementsAre("short.raw", "long.raw", "ok.raw"));
+}
+
+TEST(RenderTest, DemoFrameRendersAsColourBars) {
+  ScratchDir scratch;
+  const RunResult demo = RunOrvex({"demo", "--size", "64x32", "--frames", "2", "--out",
+                                   scratch.path(), "--dump", scratch.File("dump")});
+  ASSERT_EQ(demo.code, kExitOk) << demo.err;
+  const std::string& out = demo.out;
+  const std::string marker = "render it with: orvex ";
+  const size_t at = out.find(marker);
+  ASSERT_NE(at, std::string::npos) << out;
+  std::vector<std::string> args =
+      absl::StrSplit(out.substr(at + marker.size(), out.find('\n', at) - at - marker.size()), ' ');
+  const RunResult render = RunOrvex(args);
+  ASSERT_EQ(render.code, kExitOk) << render.err;
+  const Picture picture = ReadPng(args.back());
+  ASSERT_EQ(picture.width, 64);
+  ASSERT_EQ(picture.height, 32);
+  const Pixel want[] = {{0, 0, {235, 235, 235}},     // white bar
+                        {44, 10, {235, 16, 16}},     // red bar
+                        {63, 31, {235, 235, 235}}};  // progress bar, last frame: full
+  for (const auto& [x, y, rgb] : want) {
+    EXPECT_TRUE(Near(At(picture, x, y), rgb, 3)) << x << "," << y;
+  }
 }
 
 }  // namespace

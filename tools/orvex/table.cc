@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+#include "fmt/format.h"
+
 namespace orvex_tool {
 
 void TextTable::AddRow(std::vector<std::string> cells) {
@@ -33,6 +35,26 @@ std::string TextTable::Render() const {
   for (const Column& column : columns_) headers.push_back(column.header);
   render_row(headers);
   for (const auto& row : rows_) render_row(row);
+  return out;
+}
+
+std::string EscapeControlCharacters(std::string_view text) {
+  std::string out;
+  out.reserve(text.size());
+  for (size_t i = 0; i < text.size(); ++i) {
+    const auto c = static_cast<unsigned char>(text[i]);
+    const auto next = i + 1 < text.size() ? static_cast<unsigned char>(text[i + 1]) : 0;
+    if (c < 0x20 || c == 0x7f) {
+      out += fmt::format("\\x{:02x}", c);
+    } else if (c == 0xc2 && next >= 0x80 && next <= 0x9f) {
+      out += fmt::format("\\u{:04x}", next);
+      ++i;
+    } else if (c == '\\') {
+      out += "\\\\";
+    } else {
+      out += static_cast<char>(c);
+    }
+  }
   return out;
 }
 

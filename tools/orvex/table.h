@@ -5,6 +5,7 @@
 // by two spaces, numeric columns right-aligned, no trailing blanks.
 
 #include <string>
+#include <string_view>
 #include <vector>
 
 namespace orvex_tool {
@@ -29,6 +30,12 @@ class TextTable {
   std::vector<Column> columns_;
   std::vector<std::vector<std::string>> rows_;
 };
+
+// `text` safe to print on a terminal: control characters (C0, DEL, NUL and
+// the UTF-8 encoded C1 range U+0080..U+009F) become "\xHH" or "\u00HH", and
+// a backslash becomes "\\", so names read from files cannot move the
+// cursor, set the title or hide earlier lines. Other UTF-8 stays as it is.
+std::string EscapeControlCharacters(std::string_view text);
 
 }  // namespace orvex_tool
 

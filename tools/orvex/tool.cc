@@ -9,7 +9,8 @@ namespace orvex_tool {
 namespace {
 
 std::vector<const Command*> AllCommands() {
-  return {&DemoCommand(), &FormatsCommand(), &LayoutCommand(), &PyramidCommand(), &CpaCommand()};
+  return {&DemoCommand(),   &FormatsCommand(), &LayoutCommand(),
+          &RenderCommand(), &PyramidCommand(), &CpaCommand()};
 }
 
 const Command* FindCommand(std::string_view name) {

@@ -59,6 +59,7 @@ struct Command {
 const Command& FormatsCommand();
 const Command& LayoutCommand();
 const Command& PyramidCommand();
+const Command& RenderCommand();
 const Command& CpaCommand();
 const Command& DemoCommand();
 
