@@ -2,14 +2,15 @@
 #define ORVEX_API_MEMORY_BUFFER_TESTING_H_
 
 // Test doubles shared by the buffer tests: a buffer over a byte vector that
-// records its unmaps and can pretend to sit at an offset of a descriptor, and
-// a fence that records its aborts and its destruction.
+// records its unmaps and can pretend to sit at an offset of a descriptor, a
+// fence that records its aborts and its destruction, and wait helpers.
 
 #include <cstdint>
 #include <memory>
 #include <mutex>
 #include <string>
 #include <utility>
+#include <variant>
 #include <vector>
 
 #include "fmt/format.h"
@@ -96,6 +97,11 @@ class RecordingFence : public Fence {
 inline Status WaitStatus(const FenceWaitResult& result) {
   if (const Status* status = std::get_if<Status>(&result)) return *status;
   return UnavailableError("not done");
+}
+
+// Whether `fence` is done, without waiting.
+inline bool IsDone(const Fence& fence) {
+  return std::holds_alternative<Status>(fence.WaitForDone(absl::ZeroDuration()));
 }
 
 }  // namespace orvex::testing
