@@ -126,12 +126,14 @@ TEST(SpanBufferTest, NestedSpansForwardToTheRoot) {
     auto mapped = inner->Map(5, 10, BufferAccessMode::kRead);
     ASSERT_THAT(mapped, IsOk());
     handle = std::move(*mapped);
+    inner->DoCpuSync(true, BufferAccessMode::kWrite);  // covers the whole root
   }
   EXPECT_EQ(static_cast<unsigned char*>(handle->data())[0], 0x5a);
   EXPECT_EQ(handle->buffer(), source);
   EXPECT_THAT(source->unmaps(), IsEmpty());
   handle.reset();
   EXPECT_THAT(source->unmaps(), ElementsAre("135/10/Read"));
+  EXPECT_THAT(source->syncs(), ElementsAre("begin Write"));
   EXPECT_THAT(cleanups, IsEmpty());
   const Buffer* raw = source.get();
   source.reset();
@@ -153,6 +155,8 @@ TEST(ProxyBufferTest, ForwardsToTheSource) {
   EXPECT_EQ((*handle)->buffer(), source);
   handle->reset();
   EXPECT_THAT(source->unmaps(), ElementsAre("4/8/Write"));
+  proxy->DoCpuSync(false, BufferAccessMode::kRead);
+  EXPECT_THAT(source->syncs(), ElementsAre("end Read"));
   EXPECT_THAT(ProxyBuffer::Make(nullptr, false, nullptr, nullptr),
               StatusIs(StatusCode::kInvalidArgument, "Invalid buffer pointer"));
 
