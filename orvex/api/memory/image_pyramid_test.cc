@@ -140,6 +140,7 @@ TEST(ImagePyramidTest, MakeFromSpansRefusals) {
       // Refused before any level size is computed.
       {-1, 2, 1u << 26, false, "pyramid level must be in [0, 31], received: -1"},
       {30, 32, 1u << 26, false, "pyramid level must be in [0, 31], received: 32"},
+      {32, 32, 1u << 26, false, "pyramid level must be in [0, 31], received: 32"},
       // No level is processed: the parent is signalled, then Make refuses.
       {2, 1, 1u << 26, true, "buffers is empty, unable to make ImagePyramid"},
       {-1, -3, 1u << 26, true, "min level must be >= 0, received: -1 unable to make ImagePyramid"},

@@ -88,6 +88,7 @@ TEST(ImagePyramidUtilsTest, BufferSizes) {
   // An empty range checks nothing else.
   EXPECT_EQ(GetTotalBufferSize({-1, -1}, {40, -40}, 0, -1), 0);
   EXPECT_EQ(GetTotalBufferSize({1, 1}, {0, 31}, 1, 8), 32);
+  EXPECT_EQ(GetTotalBufferSize({kIntMax, 1}, {0, 0}, 1, 8), kIntMax);
   EXPECT_THAT(CheckedGetTotalBufferSize({4000, 3000}, {0, 2}, 64, 10), IsOkAndHolds(19968000));
 }
 
