@@ -1,36 +1,34 @@
 #include "orvex/api/memory/buffer_attributes.h"
 
-#include <vector>
+#include <string_view>
+#include <utility>
 
 #include "gtest/gtest.h"
 
 namespace orvex {
 namespace {
 
+// One name per text function, and what values outside its table read as.
 TEST(BufferAttributesTest, Texts) {
-  const std::vector<std::pair<std::string_view, std::string_view>> cases = {
-      {TransportToString(BufferTransport::kNone), "None"},
-      {TransportToString(BufferTransport::kDma), "DMA"},
-      {TransportToString(BufferTransport::kOtf), "OTF"},
+  const std::pair<std::string_view, std::string_view> cases[] = {
       {TransportToString(BufferTransport::kOpaque), "Opaque"},
       {TransportToString(static_cast<BufferTransport>(6)), "Unknown"},
-      {AccessToString(BufferAccess::kCpu), "CPU"},
       {AccessToString(BufferAccess::kGpu), "GPU"},
-      {AccessToString(static_cast<BufferAccess>(200)), "Unknown"},
+      {AccessToString(static_cast<BufferAccess>(3)), "Unknown"},
       {SecurityToString(BufferSecurity::kNone), "None"},
       {SecurityToString(static_cast<BufferSecurity>(7)), "Secure"},
       {CachedToString(BufferCached::kCached), "Cached"},
       {CachedToString(static_cast<BufferCached>(9)), "UnCached"},
-      {CompressionToString(BufferCompression::kJpeg), "JPEG"},
       {CompressionToString(BufferCompression::kSbwcLossyMedium), "Lossy SBWC Medium Compression"},
       {CompressionToString(static_cast<BufferCompression>(7)), "Unknown"},
       {AccessModeToString(BufferAccessMode::kReadWrite), "ReadWrite"},
+      {AccessModeToString(static_cast<BufferAccessMode>(3)), "Unknown"},
   };
   for (const auto& [got, want] : cases) EXPECT_EQ(got, want);
-  BufferAttributes a{BufferTransport::kHeap, BufferAccess::kCpu, BufferSecurity::kNone,
-                     BufferCached::kUnCached, BufferCompression::kSbwc};
-  EXPECT_EQ(BufferAttributesToString(a),
-            "Transport: Heap, Access: CPU, Security: None, Cached: UnCached, Compression: SBWC");
+  EXPECT_EQ(
+      BufferAttributesToString({BufferTransport::kOtf, BufferAccess::kNone, BufferSecurity::kSecure,
+                                BufferCached::kUnCached, BufferCompression::kJpeg}),
+      "Transport: OTF, Access: None, Security: Secure, Cached: UnCached, Compression: JPEG");
   EXPECT_EQ(sizeof(BufferAttributes), 5u);
 }
 

@@ -2,14 +2,16 @@
 #define ORVEX_API_MEMORY_BUFFER_TESTING_H_
 
 // Test doubles shared by the buffer tests: a buffer over a byte vector that
-// records its unmaps and can pretend to sit at an offset of a descriptor, and
-// a fence that records its aborts and its destruction.
+// records its unmaps and cache maintenance and can pretend to sit at an
+// offset of a descriptor, a fence that records its aborts and its
+// destruction, and wait helpers.
 
 #include <cstdint>
 #include <memory>
 #include <mutex>
 #include <string>
 #include <utility>
+#include <variant>
 #include <vector>
 
 #include "fmt/format.h"
@@ -47,6 +49,15 @@ class RecordingBuffer : public Buffer {
     std::lock_guard<std::mutex> lock(mutex_);
     return unmaps_;
   }
+  // "begin <mode>" or "end <mode>" of every DoCpuSync, in order.
+  std::vector<std::string> syncs() const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    return syncs_;
+  }
+  void DoCpuSync(bool begin, BufferAccessMode mode) const override {
+    std::lock_guard<std::mutex> lock(mutex_);
+    syncs_.push_back(fmt::format("{} {}", begin ? "begin" : "end", AccessModeToString(mode)));
+  }
 
   using Buffer::CheckMapRange;
   using Buffer::SharedSelf;
@@ -72,6 +83,7 @@ class RecordingBuffer : public Buffer {
   int64_t offset_;
   mutable std::mutex mutex_;
   std::vector<std::string> unmaps_;
+  mutable std::vector<std::string> syncs_;
 };
 
 // Done with `status`; counts Abort calls and reports its destruction.
@@ -96,6 +108,11 @@ class RecordingFence : public Fence {
 inline Status WaitStatus(const FenceWaitResult& result) {
   if (const Status* status = std::get_if<Status>(&result)) return *status;
   return UnavailableError("not done");
+}
+
+// Whether `fence` is done, without waiting.
+inline bool IsDone(const Fence& fence) {
+  return std::holds_alternative<Status>(fence.WaitForDone(absl::ZeroDuration()));
 }
 
 }  // namespace orvex::testing
