@@ -11,7 +11,6 @@
 #include <string>
 #include <vector>
 
-#include "absl/time/time.h"
 #include "gmock/gmock.h"
 #include "gtest/gtest.h"
 #include "orvex/status/status.h"
@@ -83,8 +82,8 @@ TEST(LogTest, LinesReachLibbaseAboveItsThreshold) {
     ORVEX_LOG(ERROR) << text("error");
   }
   ORVEX_LOG(INFO) << text("info");
-  // StatusBuilder logs from the location it was given; libbase keeps the
-  // file's base name.
+  // StatusBuilder's lines come from its own unit, with the caller's location
+  // in the text.
   Status s = InternalErrorBuilder(SourceLocation(12, "api/unit.cc")).Log(StatusBuilder::kError);
   EXPECT_EQ(evaluated, 3);
   EXPECT_THAT(capture.lines(),
@@ -96,8 +95,7 @@ TEST(LogTest, LinesReachLibbaseAboveItsThreshold) {
 // severity test changes it, whether the line is written or not.
 TEST(LogTest, ErrnoSurvivesEveryLogCall) {
   should_log_errno = EILSEQ;
-  // Each round logs from its own location: rate limits count per location.
-  SourceLocation loc(7, "errno_test.cc");
+  const SourceLocation loc(7, "errno_test.cc");
   const std::vector<std::pair<const char*, std::function<void()>>> calls = {
       {"INFO", [] { ORVEX_LOG(INFO) << "info"; }},
       {"WARNING", [] { ORVEX_LOG(WARNING) << "warning"; }},
@@ -107,30 +105,12 @@ TEST(LogTest, ErrnoSurvivesEveryLogCall) {
        [] {
          ORVEX_CHECK(errno == EDOM) << "seen by the condition";
          ORVEX_CHECK_EQ(errno, EDOM);
-         ORVEX_CHECK_NE(1, 2);
-         ORVEX_CHECK_LT(1, 2);
-         ORVEX_CHECK_LE(2, 2);
-         ORVEX_CHECK_GT(3, 2);
-         ORVEX_CHECK_GE(3, 3);
        }},
       {"StatusBuilder Log",
        [&] { Status s = InternalErrorBuilder(loc).Log(StatusBuilder::kError) << "logged"; }},
-      {"StatusBuilder LogEveryN",
-       [&] {
-         for (int i = 0; i < 3; ++i) {
-           Status s = InternalErrorBuilder(loc).LogEveryN(StatusBuilder::kWarning, 2) << i;
-         }
-       }},
-      {"StatusBuilder LogEvery",
-       [&] {
-         for (int i = 0; i < 2; ++i) {
-           Status s = InternalErrorBuilder(loc).LogEvery(StatusBuilder::kInfo, absl::Hours(1));
-         }
-       }},
   };
   for (const bool quiet : {false, true}) {
     android::base::ScopedLogSeverity threshold(quiet ? android::base::FATAL : android::base::INFO);
-    loc = SourceLocation(quiet ? 8 : 7, "errno_test.cc");
     for (const auto& [name, call] : calls) {
       SCOPED_TRACE(::testing::Message() << name << (quiet ? ", not logged" : ", logged"));
       const int calls_before = should_log_calls;
