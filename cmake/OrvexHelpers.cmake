@@ -45,29 +45,6 @@ macro(orvex_configure_sanitizers)
   endif()
 endmacro()
 
-# Log lines name the source unit relative to orvex/ without its extension
-# (for example "api/debug/perf_trace"). Each library source gets its unit as
-# the ORVEX_SOURCE_UNIT definition.
-function(orvex_set_source_units target)
-  get_target_property(sources ${target} SOURCES)
-  get_target_property(source_dir ${target} SOURCE_DIR)
-  foreach(src IN LISTS sources)
-    if(NOT src MATCHES "\\.(cc|cpp)$")
-      continue()
-    endif()
-    if(IS_ABSOLUTE "${src}")
-      set(abs "${src}")
-    else()
-      set(abs "${source_dir}/${src}")
-    endif()
-    file(RELATIVE_PATH rel "${PROJECT_SOURCE_DIR}" "${abs}")
-    string(REGEX REPLACE "^orvex/" "" unit "${rel}")
-    string(REGEX REPLACE "\\.(cc|cpp)$" "" unit "${unit}")
-    set_property(SOURCE "${abs}" TARGET_DIRECTORY ${target}
-                 APPEND PROPERTY COMPILE_DEFINITIONS "ORVEX_SOURCE_UNIT=\"${unit}\"")
-  endforeach()
-endfunction()
-
 # Cross builds run the tests under an emulator (CMAKE_CROSSCOMPILING_EMULATOR).
 # Death tests that re-execute the test program need it as well, since the host
 # cannot start a foreign binary by itself: ORVEX_TEST_EXEC_WRAPPER gives them
@@ -89,7 +66,7 @@ function(orvex_test name)
   endif()
   cmake_parse_arguments(T "" "" "SOURCES;LIBS;LABELS" ${ARGN})
   add_executable(${name} ${T_SOURCES})
-  target_link_libraries(${name} PRIVATE orvex_base orvex_testing GTest::gmock_main ${T_LIBS})
+  target_link_libraries(${name} PRIVATE orvex_base orvex_testing orvex_test_main ${T_LIBS})
   orvex_target_warnings(${name})
   add_test(NAME ${name} COMMAND ${name})
   set_tests_properties(${name} PROPERTIES TIMEOUT 300)

@@ -1,6 +1,7 @@
 # Installation: the libraries, public headers (the library's and the
 # platform layer's), generated schema headers, a CMake package giving
-# orvex::orvex_base, and a pkg-config file.
+# orvex::orvex_base, and a pkg-config file. Both find Android's base
+# libraries where Debian installs them (cmake/OrvexAndroidPlatform.cmake).
 include(GNUInstallDirs)
 include(CMakePackageConfigHelpers)
 
@@ -18,6 +19,7 @@ install(DIRECTORY ${PROJECT_SOURCE_DIR}/orvex/
   FILES_MATCHING PATTERN "*.h"
   PATTERN "*_test.h" EXCLUDE)
 install(DIRECTORY ${PROJECT_SOURCE_DIR}/platform/include/
+                  ${PROJECT_SOURCE_DIR}/platform/host_include/
   DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}/orvex/platform
   FILES_MATCHING PATTERN "*.h")
 # Generated headers (Protocol Buffers schema) under the build tree.
@@ -39,6 +41,7 @@ write_basic_package_version_file(
 install(FILES
   ${PROJECT_BINARY_DIR}/orvexConfig.cmake
   ${PROJECT_BINARY_DIR}/orvexConfigVersion.cmake
+  ${PROJECT_SOURCE_DIR}/cmake/OrvexAndroidPlatform.cmake
   DESTINATION ${CMAKE_INSTALL_LIBDIR}/cmake/orvex)
 
 # The .pc file finds its prefix relative to its own directory, so the

@@ -11,9 +11,14 @@ packages=(
   libgtest-dev libgmock-dev libbenchmark-dev
   libhwy-dev
   libpng-dev libexpat1-dev
+  android-libbase-dev android-liblog-dev android-libcutils-dev
+  blueprint-tools
 )
+# Android's own base libraries (libbase, liblog, libcutils) come from Debian's
+# android-*-dev packages; blueprint-tools gives bpfmt for the Android.bp check.
 # Extra package groups, chosen with arguments: "asan"/"tsan" need nothing
-# beyond g++; "clang" adds the compiler and runtime for fuzzing; "coverage"
+# beyond g++; "clang" adds the compiler and runtime for fuzzing and the Clang
+# user build; "coverage"
 # adds the coverage report generator; "aarch64" adds the 64-bit Arm cross
 # compiler, the arm64 builds of the libraries (multiarch) and qemu-user to run
 # the tests.
@@ -26,7 +31,9 @@ for group in "$@"; do
       packages+=(g++-aarch64-linux-gnu qemu-user
                  libabsl-dev:arm64 libfmt-dev:arm64 libprotobuf-dev:arm64
                  libgtest-dev:arm64 libgmock-dev:arm64 libbenchmark-dev:arm64
-                 libhwy-dev:arm64 libpng-dev:arm64 libexpat1-dev:arm64) ;;
+                 libhwy-dev:arm64 libpng-dev:arm64 libexpat1-dev:arm64
+                 android-libbase-dev:arm64 android-liblog-dev:arm64
+                 android-libcutils-dev:arm64) ;;
     tidy) packages+=(clang-tidy clang-format) ;;
     coverage) packages+=(gcovr) ;;
     *) ;;

@@ -1,5 +1,9 @@
 #include "orvex/status/log.h"
 
+#include <pthread.h>
+#include <signal.h>
+#include <time.h>
+
 #include <memory>
 
 namespace orvex {
@@ -13,8 +17,33 @@ FatalLogLine::FatalLogLine(const char* unit, int line, std::string* check_text)
   stream_ << "Check failed: " << *text;
 }
 
+SigpipeGuard::SigpipeGuard() noexcept {
+  sigset_t pending;
+  was_pending_ = sigpending(&pending) == 0 && sigismember(&pending, SIGPIPE) == 1;
+  sigset_t pipe_signal;
+  sigemptyset(&pipe_signal);
+  sigaddset(&pipe_signal, SIGPIPE);
+  blocked_ = pthread_sigmask(SIG_BLOCK, &pipe_signal, &old_mask_) == 0;
+}
+
+SigpipeGuard::~SigpipeGuard() {
+  if (!blocked_) return;
+  sigset_t pending;
+  if (!was_pending_ && sigpending(&pending) == 0 && sigismember(&pending, SIGPIPE) == 1) {
+    sigset_t pipe_signal;
+    sigemptyset(&pipe_signal);
+    sigaddset(&pipe_signal, SIGPIPE);
+    const struct timespec no_wait = {0, 0};
+    while (sigtimedwait(&pipe_signal, nullptr, &no_wait) < 0 && errno == EINTR) {
+    }
+  }
+  pthread_sigmask(SIG_SETMASK, &old_mask_, nullptr);
+}
+
 FatalLogLine::~FatalLogLine() {
   ErrnoSaver errno_saver;
+  // The process ends with the abort below, not with a SIGPIPE.
+  SigpipeGuard sigpipe_guard;
   if (android::base::ShouldLog(android::base::FATAL, nullptr)) {
     android::base::LogMessage(unit_, static_cast<unsigned>(line_), android::base::FATAL, nullptr,
                               -1)

@@ -3,10 +3,16 @@
 
 // Logging and contract checks of the library.
 //
-// Every line goes to the platform's base logging facility: the severity is
-// tested first with ShouldLog() (nothing is formatted when it answers false),
-// then one LogMessage is written with the source unit and line, no tag and no
-// error number. errno seen by the caller is unchanged by a log statement.
+// Every line goes to Android's base logging library (libbase): the severity
+// is tested first with ShouldLog() (nothing is formatted when it answers
+// false), then one LogMessage is written with the source unit and line, no
+// tag and no error number. The threshold, the line layout and where lines go
+// are libbase's (on a host: stderr, INFO and up unless the program changes
+// it with SetMinimumLogSeverity or InitLogging and ANDROID_LOG_TAGS).
+//
+// Guarantees of our own, whatever the logger does: errno seen by the caller
+// is unchanged by a log statement, and a line written to a pipe whose reader
+// has gone is lost instead of ending the process with SIGPIPE.
 //
 //   ORVEX_LOG(WARNING) << "buffer " << id << " is not mapped";
 //   ORVEX_CHECK(fd >= 0) << "bad descriptor";
@@ -22,7 +28,9 @@
 // Thread safety: all macros may be used from any thread.
 
 #include <errno.h>
+#include <signal.h>
 
+#include <cstddef>
 #include <cstdlib>
 #include <ostream>
 #include <sstream>
@@ -32,14 +40,39 @@
 #include "android-base/logging.h"
 #include "orvex/base/export.h"
 
-// The source unit of the current file relative to orvex/ (set by the build
-// for library sources); other code logs with its file name.
-#ifndef ORVEX_SOURCE_UNIT
-#define ORVEX_SOURCE_UNIT __FILE__
-#endif
-
 namespace orvex {
 namespace log_internal {
+
+// The source unit of a file path, worked out while compiling: the path after
+// its last "orvex/" directory, without the extension
+// (".../orvex/api/debug/perf_trace.cc" gives "api/debug/perf_trace"). Any
+// build, CMake or an Android tree, names units alike.
+template <size_t N>
+struct SourceUnit {
+  consteval SourceUnit(const char (&path)[N]) {  // NOLINT: converts a literal
+    constexpr char kRoot[] = "orvex/";
+    size_t begin = 0;
+    for (size_t i = 0; i + 6 < N; ++i) {
+      bool match = i == 0 || path[i - 1] == '/';
+      for (size_t k = 0; k < 6 && match; ++k) match = path[i + k] == kRoot[k];
+      if (match) begin = i + 6;
+    }
+    size_t end = N - 1;
+    for (size_t i = N - 1; i > begin && path[i - 1] != '/'; --i) {
+      if (path[i - 1] == '.') {
+        end = i - 1;
+        break;
+      }
+    }
+    for (size_t i = begin; i < end; ++i) text[i - begin] = path[i];
+  }
+  char text[N] = {};
+};
+
+template <SourceUnit kUnit>
+constexpr const char* SourceUnitText() {
+  return kUnit.text;
+}
 
 // Keeps the caller's errno across a log statement.
 class ErrnoSaver {
@@ -62,8 +95,25 @@ inline bool ShouldLog(android::base::LogSeverity severity) {
   return android::base::ShouldLog(severity, nullptr);
 }
 
-// One log line. The ErrnoSaver is declared first so that it is destroyed
-// last, after the platform message has been written.
+// Holds SIGPIPE back from the calling thread while a line is written: a
+// logger writing to a pipe nobody reads (libbase's stderr logger does) would
+// otherwise end the process. A SIGPIPE the write raised is discarded; one
+// that was pending before stays pending. Changes errno.
+class ORVEX_EXPORT SigpipeGuard {
+ public:
+  SigpipeGuard() noexcept;
+  ~SigpipeGuard();
+  SigpipeGuard(const SigpipeGuard&) = delete;
+  SigpipeGuard& operator=(const SigpipeGuard&) = delete;
+
+ private:
+  sigset_t old_mask_;
+  bool blocked_;
+  bool was_pending_;
+};
+
+// One log line. Members are destroyed in reverse order: the platform message
+// is written first, then SIGPIPE is released, then errno restored.
 class LogLine {
  public:
   LogLine(const char* unit, int line, android::base::LogSeverity severity)
@@ -72,6 +122,7 @@ class LogLine {
 
  private:
   ErrnoSaver errno_saver_;
+  SigpipeGuard sigpipe_guard_;
   android::base::LogMessage message_;
 };
 
@@ -149,6 +200,11 @@ ORVEX_INTERNAL_DEFINE_CHECK_OP(GE, >=)
 
 }  // namespace log_internal
 }  // namespace orvex
+
+// Log lines name the unit of the file that logs; a build may set its own.
+#ifndef ORVEX_SOURCE_UNIT
+#define ORVEX_SOURCE_UNIT (::orvex::log_internal::SourceUnitText<__FILE__>())
+#endif
 
 // ORVEX_LOG(severity): severity is one of INFO, WARNING, ERROR, FATAL.
 #define ORVEX_LOG(severity) ORVEX_INTERNAL_LOG_##severity

@@ -178,7 +178,7 @@ void StatusBuilder::ConditionallyLog(const Status& status) const {
   if (severity == android::base::FATAL) {
     log_internal::FatalLogLine(ORVEX_SOURCE_UNIT, __LINE__).stream() << text;
   }
-  android::base::LogMessage(ORVEX_SOURCE_UNIT, __LINE__, severity, nullptr, -1).stream() << text;
+  log_internal::LogLine(ORVEX_SOURCE_UNIT, __LINE__, severity).stream() << text;
 }
 
 std::ostream& operator<<(std::ostream& os, const StatusBuilder& builder) {

@@ -131,7 +131,7 @@ TEST(StatusBuilderTest, LogAlwaysWritesLocationAndStatus) {
   EXPECT_EQ(errno, ENOTDIR);
   ASSERT_EQ(lines.size(), 1u);
   EXPECT_THAT(lines[0], HasSubstr("fake/file.cc:77: DATA_LOSS: bits; tail"));
-  EXPECT_EQ(lines[0][0], 'W');
+  EXPECT_THAT(lines[0], ::testing::ContainsRegex("^[^ ]+ W "));  // tag, then severity
 }
 
 TEST(StatusBuilderTest, EveryNCountsPerLocation) {

@@ -21,6 +21,7 @@ TEST(InMemoryCameraMetadataTest, TypedLookups) {
 
   EXPECT_EQ(Values(metadata.GetUint8Entry(0x1000D)), (std::vector<uint8_t>{4, 9}));
   EXPECT_EQ(Values(metadata.GetInt32Entry(0x84000000)), (std::vector<int32_t>{-3}));
+  EXPECT_TRUE(metadata.GetInt32Entry(0x1000D).empty());
   // Absent tags, empty entries and entries of the other type read as empty.
   const struct {
     uint32_t tag;
@@ -28,13 +29,9 @@ TEST(InMemoryCameraMetadataTest, TypedLookups) {
   } empty_u8[] = {{0x10007, true}, {0x84000000, true}, {0x1, false}};
   for (const auto& c : empty_u8) {
     SCOPED_TRACE(c.tag);
-    const auto view = metadata.GetUint8Entry(c.tag);
-    EXPECT_TRUE(view.empty());
-    EXPECT_EQ(view.size(), 0u);
-    EXPECT_TRUE(view.span().empty());
+    EXPECT_EQ(metadata.GetUint8Entry(c.tag).size(), 0u);
     EXPECT_EQ(metadata.Contains(c.tag), c.contained);
   }
-  EXPECT_TRUE(metadata.GetInt32Entry(0x1000D).empty());
   EXPECT_EQ(metadata.size(), 3u);
 }
 
@@ -46,17 +43,14 @@ TEST(InMemoryCameraMetadataTest, ViewsOutliveChangesAndOwner) {
     before = metadata.GetUint8Entry(7);
     metadata.SetInt32(7, {5});  // Replaces the entry with another type.
     EXPECT_TRUE(metadata.GetUint8Entry(7).empty());
-    EXPECT_EQ(Values(metadata.GetInt32Entry(7)), (std::vector<int32_t>{5}));
 
     InMemoryCameraMetadata copy = metadata;
     EXPECT_TRUE(metadata.Erase(7));
     EXPECT_FALSE(metadata.Erase(7));
-    EXPECT_EQ(metadata.size(), 0u);
     EXPECT_EQ(Values(copy.GetInt32Entry(7)), (std::vector<int32_t>{5}));
   }
   // The metadata is gone; the view still owns the old values.
   EXPECT_EQ(Values(before), (std::vector<uint8_t>{1, 2, 3}));
-  EXPECT_EQ(before[2], 3);
 }
 
 }  // namespace

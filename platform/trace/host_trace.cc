@@ -3,6 +3,7 @@
 
 #include "host_trace/host_trace.h"
 
+#include <dlfcn.h>
 #include <errno.h>
 #include <fcntl.h>
 #include <pthread.h>
@@ -33,12 +34,37 @@ namespace {
 
 constexpr uint64_t kDefaultTags = ATRACE_TAG_ALWAYS | ATRACE_TAG_CAMERA;
 
+// The process binds each trace entry point to the first loaded library that
+// defines it. Debian's libcutils defines them all as no-ops: loaded ahead of
+// this library, it would take every marker but the section ends written to
+// the descriptor, so recording is refused instead of producing a broken
+// trace. Links that put this library first, or a preload, avoid that. (The
+// two variables are not checked: whichever definition wins, every library
+// uses the same one, possibly the program's copy.)
+bool EntryPointsAreOurs() {
+  Dl_info ours, bound;
+  void* const begin = dlsym(RTLD_DEFAULT, "atrace_begin_body");
+  if (dladdr(&kDefaultTags, &ours) == 0 || begin == nullptr || dladdr(begin, &bound) == 0) {
+    return false;
+  }
+  if (bound.dli_fbase == ours.dli_fbase) return true;
+  std::fprintf(stderr,
+               "host trace: the trace entry points are bound to %s, loaded ahead of %s; link or "
+               "preload (LD_PRELOAD) the recorder first\n",
+               bound.dli_fname, ours.dli_fname);
+  return false;
+}
+
 // The file being recorded and the threads already named in it.
 class Recorder {
  public:
   int Start(const char* path) {
     std::lock_guard<std::mutex> lock(mutex_);
     FinishLocked();
+    if (!EntryPointsAreOurs()) {
+      errno = ENOTSUP;
+      return -1;
+    }
     FILE* file = std::fopen(path, "w");
     if (file == nullptr) return -1;
     if (marker_fd_ == -1) {

@@ -6,7 +6,9 @@
 
 #include "absl/strings/str_join.h"
 #include "fmt/format.h"
+#ifndef __ANDROID__
 #include "host_trace/host_trace.h"
+#endif
 #include "orvex/api/debug/perf_trace.h"
 #include "tools/orvex/demo.h"
 #include "tools/orvex/format_names.h"
@@ -80,18 +82,28 @@ int RunDemoCommand(const ParsedArgs& args, CommandContext& context) {
 
   const std::optional<std::string> trace = args.Get("trace");
   if (trace.has_value()) {
+#ifdef __ANDROID__
+    // No host trace library on a device: the library's markers go to the
+    // system trace there.
+    return context.UsageError(
+        "--trace records on a development host; on a device record the "
+        "system trace (camera category) instead");
+#else
     if (orvex_host_trace_start(trace->c_str()) != 0) {
       return context.Error(
           orvex::StatusFromErrno(errno, fmt::format("cannot trace into {}", *trace)));
     }
     orvex::PerfTrace::trace_level_.store(kDemoTraceLevel);
+#endif
   }
   auto report = RunDemo(options);
   // A trace cut short (full disk) is no valid JSON: never recommend it.
   orvex::Status traced = orvex::OkStatus();
+#ifndef __ANDROID__
   if (trace.has_value() && orvex_host_trace_stop() != 0) {
     traced = orvex::StatusFromErrno(errno, fmt::format("cannot write the trace {}", *trace));
   }
+#endif
   if (!report.ok()) {
     if (!traced.ok()) context.Error(traced);
     return context.Error(report.status());

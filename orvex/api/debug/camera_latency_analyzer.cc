@@ -12,6 +12,7 @@
 
 #include "absl/container/flat_hash_map.h"
 #include "absl/strings/match.h"
+#include "absl/strings/str_cat.h"
 #include "absl/strings/string_view.h"
 #include "absl/time/clock.h"
 #include "absl/time/time.h"
@@ -79,8 +80,8 @@ int MoveNoReplace(const std::string& from, const std::string& to) {
 // A temporary file in `directory`, hidden and unique within the system.
 std::string TemporaryPath(std::string_view directory, std::string_view name) {
   static std::atomic<uint64_t> counter{0};
-  return JoinPath(directory, "." + std::string(name) + ".tmp-" + std::to_string(getpid()) + "-" +
-                                 std::to_string(counter.fetch_add(1)));
+  return JoinPath(directory, absl::StrCat(".", std::string(name), ".tmp-", getpid(), "-",
+                                          counter.fetch_add(1)));
 }
 
 }  // namespace

@@ -309,7 +309,7 @@ TEST_F(LatencyAnalyzerTest, WriteFailuresAreReportedAndRecordsCleared) {
   ::testing::internal::CaptureStderr();
   analyzer_.WriteLatencyData(true);
   const std::string log = ::testing::internal::GetCapturedStderr();
-  EXPECT_THAT(log, HasSubstr("api/debug/camera_latency_analyzer:"));
+  EXPECT_THAT(log, HasSubstr(" camera_latency_analyzer:"));
   EXPECT_THAT(log, HasSubstr("] [CPA] Not able to write camera-ended Proto to disk\n"));
   EXPECT_EQ(RecordedOperations(), 0);
 

@@ -20,14 +20,19 @@ void PerfTrace::FailNegativeLevel(int level) {
 }  // namespace orvex
 
 // The trace library is optional: its entry points are bound weakly, so their
-// addresses are null when it is not loaded.
+// addresses are null when it is not loaded. cutils/trace.h declares the
+// functions only inside its inline wrappers (which would start the trace
+// library's own set-up); the library calls them directly, behind its own
+// enabled test.
 #pragma weak atrace_marker_fd
 #pragma weak atrace_enabled_tags
-#pragma weak atrace_begin_body
-#pragma weak atrace_int_body
-#pragma weak atrace_int64_body
-#pragma weak atrace_async_begin_body
-#pragma weak atrace_async_end_body
+extern "C" {
+__attribute__((weak)) void atrace_begin_body(const char* name);
+__attribute__((weak)) void atrace_int_body(const char* name, int32_t value);
+__attribute__((weak)) void atrace_int64_body(const char* name, int64_t value);
+__attribute__((weak)) void atrace_async_begin_body(const char* name, int32_t cookie);
+__attribute__((weak)) void atrace_async_end_body(const char* name, int32_t cookie);
+}
 
 namespace orvex {
 namespace {

@@ -1,5 +1,7 @@
 // Runs with the host trace library: markers reach the recorded trace.
 
+#include <dlfcn.h>
+
 #include <cerrno>
 #include <cstdlib>
 #include <string>
@@ -46,7 +48,7 @@ TEST(HostTraceTest, CameraTagBitAndMarkerDescriptorGateEverything) {
   const struct {
     uint64_t tags;
     size_t events;
-  } cases[] = {{ATRACE_TAG_CAMERA, 5}, {~ATRACE_TAG_CAMERA, 0}, {0, 0}};
+  } cases[] = {{ATRACE_TAG_CAMERA, 5}, {~uint64_t{ATRACE_TAG_CAMERA}, 0}, {0, 0}};
   for (const auto& c : cases) {
     SCOPED_TRACE(c.tags);
     TraceRecording recording;
@@ -99,6 +101,23 @@ TEST(HostTraceDeathTest, StopReportsFailedWrites) {
         exit(0);
       },
       ::testing::ExitedWithCode(0), "host trace: cannot write /dev/full: No space left on device");
+}
+
+// libcutils, linked after the recorder, defines the same entry points as
+// no-ops: the tests above record all the same. Registered again with
+// libcutils preloaded ahead of the recorder, where recording is refused.
+TEST(HostTraceTest, LibcutilsAlongside) {
+  ASSERT_NE(dlopen("libcutils.so.0", RTLD_NOW | RTLD_NOLOAD), nullptr);
+  if (std::getenv("ORVEX_TEST_CUTILS_FIRST") == nullptr) {
+    TraceRecording recording;
+    { ScopedTrace section("beside libcutils"); }
+    EXPECT_THAT(recording.Stop(), ElementsAre("B beside libcutils" + kMe, "E" + kMe));
+    return;
+  }
+  const std::string path = ::testing::TempDir() + "refused.json";
+  EXPECT_EQ(orvex_host_trace_start(path.c_str()), -1);
+  EXPECT_EQ(errno, ENOTSUP);
+  EXPECT_EQ(atrace_marker_fd, -1);
 }
 
 // Registered a second time with ORVEX_TRACE_FILE set (see CMakeLists.txt).

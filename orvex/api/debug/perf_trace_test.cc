@@ -7,7 +7,7 @@
 #include "gtest/gtest.h"
 
 #pragma weak atrace_marker_fd
-#pragma weak atrace_begin_body
+extern "C" __attribute__((weak)) void atrace_begin_body(const char* name);
 
 namespace orvex {
 namespace {
@@ -30,7 +30,7 @@ TEST(PerfTraceTest, WithoutTraceLibraryEveryOperationIsANoOp) {
 
 TEST(PerfTraceDeathTest, NegativeLevelIsFatal) {
   EXPECT_DEATH(PerfTrace(-1, "bad"),
-               "api/debug/perf_trace:16\\] Check failed: level >= TraceLevel::kAlways "
+               "perf_trace:16\\] Check failed: level >= TraceLevel::kAlways "
                "\\(level=-1, TraceLevel::kAlways=0\\) TraceLevel must be >= kAlways");
 }
 

@@ -364,7 +364,7 @@ TEST_F(HwBufferTest, SyncFailuresAreLoggedNotReported) {
   buffer->DoCpuSync(false, kWrite);
   EXPECT_EQ(errno, EIO);
   EXPECT_THAT(::testing::internal::GetCapturedStderr(),
-              ::testing::MatchesRegex("E .*\\] DMA_BUF_IOCTL_SYNC failed with code: -1 errno: "
+              ::testing::MatchesRegex("[^ ]+ E .*\\] DMA_BUF_IOCTL_SYNC failed with code: -1 errno: "
                                       "Input/output error\n"));
   EXPECT_THAT(TakeSyncs(fd_), ElementsAre(6, 6));
 }

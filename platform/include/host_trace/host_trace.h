@@ -21,6 +21,10 @@
 // atrace_marker_fd are attributed to the writing thread: the library
 // interposes write(2) and forwards every call to the kernel unchanged.
 //
+// The process must bind the trace entry points to this library: link it
+// ahead of any other library that defines them (Debian's libcutils does, as
+// no-ops) or preload it with LD_PRELOAD. Otherwise recording is refused.
+//
 // Thread safety: the entry points may be called from any thread. start and
 // stop must not race with each other.
 
@@ -30,8 +34,9 @@ extern "C" {
 
 // Starts recording into `path` (created or truncated), finishing any current
 // recording first (stop it before to learn whether it was written in full).
-// Returns 0, or -1 with errno set when the file cannot be opened (recording
-// then stays off).
+// Returns 0, or -1 with errno set when the file cannot be opened or (ENOTSUP,
+// explained on stderr) another library's trace entry points come first in the
+// process; recording then stays off.
 int orvex_host_trace_start(const char* path);
 
 // Finishes the current recording: closes the event array and the file and
