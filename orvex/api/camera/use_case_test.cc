@@ -13,14 +13,14 @@ using android::nuvora_camera_hal::InMemoryCameraMetadata;
 using enum StreamMode;
 using enum StreamUseCase;
 
-constexpr int kAbsent = -1;
+constexpr std::optional<uint8_t> kAbsent = std::nullopt;
 
 struct ModeCase {
   StreamUseCaseSet use_cases;
   bool blob;  // a BLOB stream beside the YCBCR_420_888 one
   uint64_t usage;
-  int intent;  // kAbsent or the capture intent
-  int af_mode;
+  std::optional<uint8_t> intent;
+  std::optional<uint8_t> af_mode;
   StreamMode want;
 };
 
@@ -43,10 +43,6 @@ const ModeCase kModeCases[] = {
     {{}, true, 0, 2, 3, kStillSnapshot},
 };
 
-std::optional<uint8_t> Optional(int value) {
-  return value == kAbsent ? std::nullopt : std::optional<uint8_t>(value);
-}
-
 // The metadata form must agree with the five-argument form on every case.
 TEST(StreamModeTest, BothForms) {
   for (size_t i = 0; i < std::size(kModeCases); ++i) {
@@ -54,12 +50,10 @@ TEST(StreamModeTest, BothForms) {
     const ModeCase& c = kModeCases[i];
     HalPixelFormatSet formats = {orvex::HalPixelFormat::YCBCR_420_888};
     if (c.blob) formats.insert(orvex::HalPixelFormat::BLOB);
-    EXPECT_EQ(GetStreamMode(c.use_cases, formats, c.usage, Optional(c.intent), Optional(c.af_mode)),
-              c.want);
+    EXPECT_EQ(GetStreamMode(c.use_cases, formats, c.usage, c.intent, c.af_mode), c.want);
     InMemoryCameraMetadata request;
-    if (c.intent != kAbsent)
-      request.SetUint8(kCaptureIntentTag, {static_cast<uint8_t>(c.intent), 2});
-    if (c.af_mode != kAbsent) request.SetUint8(kAfModeTag, {static_cast<uint8_t>(c.af_mode)});
+    if (c.intent) request.SetUint8(kCaptureIntentTag, {*c.intent, 2});
+    if (c.af_mode) request.SetUint8(kAfModeTag, {*c.af_mode});
     EXPECT_EQ(GetStreamMode(c.use_cases, formats, c.usage, request), c.want);
   }
   // An entry with no values, or of another type, counts as absent.

@@ -12,16 +12,13 @@ namespace {
 
 constexpr char kFatpEnable[] = "persist.vendor.camera.fatp.enable";
 
-// The result of a read and the value it left ("untouched" when none).
-std::pair<int, std::string> Read(const orvex_api::PropertyProxy& proxy, const std::string& key) {
-  std::string value = "untouched";
-  const int result = proxy.SystemPropertyGet(key, value);
-  return {result, value};
-}
+// The result of a read, with or without a default, and the value it left
+// ("untouched" when none).
+template <typename... Default>
 std::pair<int, std::string> Read(const orvex_api::PropertyProxy& proxy, const std::string& key,
-                                 const std::string& default_value) {
+                                 const Default&... default_value) {
   std::string value = "untouched";
-  const int result = proxy.SystemPropertyGet(key, default_value, value);
+  const int result = proxy.SystemPropertyGet(key, std::string(default_value)..., value);
   return {result, value};
 }
 

@@ -42,15 +42,24 @@ TEST(AlgorithmRecordsTest, EnumerationTexts) {
             "suppression|");
   EXPECT_EQ(ToString(static_cast<PdafSoftwareFeatureFlag>(0xFFF8)), "");
 
-  // The ends of the named runs of CSI codes and the gaps between them.
-  std::string csi;
-  for (int code : {17, 18, 19, 24, 36, 37, 40, 47, 48, 55, 56, 62, 63, 64}) {
-    csi += Text(static_cast<CsiDataType>(code)) + "|";
+  // Every CSI code from 17 to 64: the named ones, and how many are not.
+  std::string named;
+  int unknown = 0;
+  for (int code = 17; code <= 64; ++code) {
+    const std::string text = Text(static_cast<CsiDataType>(code));
+    if (text == "unknown_csi_data_type") {
+      ++unknown;
+    } else {
+      named += std::to_string(code) + ":" + text + " ";
+    }
   }
-  EXPECT_EQ(csi,
-            "unknown_csi_data_type|8_bit_data|unknown_csi_data_type|yuv_420_8_bit|rgb_888|"
-            "unknown_csi_data_type|raw_6|raw_20|user_defined_0|user_defined_7|"
-            "unknown_csi_data_type|unknown_csi_data_type|undefined|unknown_csi_data_type|");
+  EXPECT_EQ(unknown, 21);
+  EXPECT_EQ(named,
+            "18:8_bit_data 24:yuv_420_8_bit 25:yuv_420_10_bit 30:yuv_422_8_bit 31:yuv_422_10_bit "
+            "32:rgb_444 33:rgb_555 34:rgb_565 35:rgb_666 36:rgb_888 40:raw_6 41:raw_7 42:raw_8 "
+            "43:raw_10 44:raw_12 45:raw_14 46:raw_16 47:raw_20 48:user_defined_0 49:user_defined_1 "
+            "50:user_defined_2 51:user_defined_3 52:user_defined_4 53:user_defined_5 "
+            "54:user_defined_6 55:user_defined_7 63:undefined ");
 }
 
 TEST(AlgorithmRecordsTest, PdafSettingTexts) {
