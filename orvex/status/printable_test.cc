@@ -9,52 +9,38 @@
 namespace orvex {
 namespace {
 
-class Crop : public Printable {
- public:
-  std::string DebugStr() const override {
-    return BuildOrvexDebugStrWithStrings("NormalizedCrop", {{"left", "0.25"}, {"top", "0.5"}});
-  }
-};
-
 TEST(DebugStrTest, Shapes) {
-  struct Case {
+  using Fields = std::vector<std::pair<std::string_view, std::string_view>>;
+  const struct {
     std::string_view type;
-    std::vector<std::pair<std::string_view, std::string_view>> fields;
+    Fields fields;
     std::string expected;
-  };
-  const std::vector<Case> cases = {
-      {"Buffer", {}, "{type: Buffer}"},
-      {"", {}, "{type: }"},
-      {"", {{"a", "1"}}, "{type: , a: 1}"},
-      {"T", {{"a", ""}, {"b", "x, y"}}, "{type: T, a: , b: x, y}"},
-      {"T", {{"a", "1"}, {"a", "2"}}, "{type: T, a: 1, a: 2}"},
-      {"T", {{"\"q\"", "{}"}}, "{type: T, \"q\": {}}"},
-  };
-  for (const Case& c : cases) {
+  } cases[] = {{"Buffer", {}, "{type: Buffer}"},
+               {"", {{"a", "1"}}, "{type: , a: 1}"},
+               {"T", {{"a", ""}, {"b", "x, y"}}, "{type: T, a: , b: x, y}"},
+               {"T", {{"a", "1"}, {"a", "2"}}, "{type: T, a: 1, a: 2}"}};
+  for (const auto& c : cases) {
     SCOPED_TRACE(c.expected);
     EXPECT_EQ(BuildOrvexDebugStr(c.type, c.fields), c.expected);
-    std::vector<std::pair<std::string, std::string>> owned;
-    for (const auto& [n, t] : c.fields) owned.emplace_back(n, t);
+    std::vector<std::pair<std::string, std::string>> owned(c.fields.begin(), c.fields.end());
     EXPECT_EQ(BuildOrvexDebugStrWithStrings(c.type, owned), c.expected);
   }
-}
-
-TEST(DebugStrTest, ContainerDebugStr) {
-  const std::vector<int> values = {1, 2, 3};
-  auto fmt = [](int v) { return std::to_string(v * 10); };
-  EXPECT_EQ(ContainerDebugStr(values, fmt), "{10, 20, 30}");
-  EXPECT_EQ(ContainerDebugStr<false>(values, fmt), "10, 20, 30");
-  EXPECT_EQ(ContainerDebugStr(std::vector<int>{}, fmt), "{}");
+  auto tens = [](int v) { return std::to_string(v * 10); };
+  EXPECT_EQ(ContainerDebugStr(std::vector<int>{1, 2, 3}, tens), "{10, 20, 30}");
+  EXPECT_EQ(ContainerDebugStr<false>(std::vector<int>{1, 2}, tens), "10, 20");
+  EXPECT_EQ(ContainerDebugStr(std::vector<int>{}, tens), "{}");
 }
 
 TEST(PrintableTest, StreamsDebugStr) {
-  Crop crop;
+  struct Crop : Printable {
+    std::string DebugStr() const override { return "{type: NormalizedCrop}"; }
+  } crop;
   std::ostringstream os;
   os << crop;
-  EXPECT_EQ(os.str(), "{type: NormalizedCrop, left: 0.25, top: 0.5}");
+  EXPECT_EQ(os.str(), "{type: NormalizedCrop}");
   EXPECT_EQ(crop.GetInstanceName(), "");
   Status s = InvalidArgumentErrorBuilder(ORVEX_LOC) << "bad crop " << crop;
-  EXPECT_EQ(s.message(), "bad crop {type: NormalizedCrop, left: 0.25, top: 0.5}");
+  EXPECT_EQ(s.message(), "bad crop {type: NormalizedCrop}");
 }
 
 }  // namespace

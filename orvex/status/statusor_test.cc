@@ -15,54 +15,45 @@ namespace {
 using ::orvex::testing::IsOk;
 using ::orvex::testing::IsOkAndHolds;
 using ::orvex::testing::StatusIs;
-using ::testing::HasSubstr;
 
-constexpr char kOkCtorMessage[] = "An OK status is not a valid constructor argument to StatusOr<T>";
-
-TEST(StatusOrTest, ValueAndError) {
+TEST(StatusOrTest, ValueErrorAndOkArguments) {
   StatusOr<int> v = 7;
   EXPECT_THAT(v, IsOkAndHolds(7));
-  EXPECT_EQ(*v, 7);
   StatusOr<int> e = NotFoundError("no");
   EXPECT_THAT(e, StatusIs(StatusCode::kNotFound, "no"));
   EXPECT_EQ(e.value_or(3), 3);
   EXPECT_THAT(StatusOr<int>(), StatusIs(StatusCode::kUnknown, ""));
-}
+  StatusOr<std::string> built = InvalidArgumentErrorBuilder(ORVEX_LOC) << "size " << 5;
+  EXPECT_THAT(built, StatusIs(StatusCode::kInvalidArgument, "size 5"));
 
-TEST(StatusOrTest, OkStatusIsReplacedByInternal) {
-  EXPECT_THAT(StatusOr<int>(OkStatus()), StatusIs(StatusCode::kInternal, kOkCtorMessage));
+  const Status ok_replaced =
+      InternalError("An OK status is not a valid constructor argument to StatusOr<T>");
+  EXPECT_EQ(StatusOr<int>(OkStatus()).status(), ok_replaced);
   StatusBuilder ok_builder(OkStatus(), ORVEX_LOC);
-  ok_builder << "ignored";
-  EXPECT_THAT(StatusOr<int>(ok_builder), StatusIs(StatusCode::kInternal, kOkCtorMessage));
-  StatusOr<int> assigned = 1;
-  assigned = OkStatus();
-  EXPECT_THAT(assigned, StatusIs(StatusCode::kInternal, kOkCtorMessage));
-}
-
-TEST(StatusOrTest, FromBuilder) {
-  StatusOr<std::string> s = InvalidArgumentErrorBuilder(ORVEX_LOC) << "size " << 5;
-  EXPECT_THAT(s, StatusIs(StatusCode::kInvalidArgument, "size 5"));
+  EXPECT_EQ(StatusOr<int>(ok_builder).status(), ok_replaced);
+  v = OkStatus();
+  EXPECT_EQ(v.status(), ok_replaced);
 }
 
 TEST(StatusOrTest, CopyMoveAssignKeepsOwnership) {
   auto counter = std::make_shared<int>(0);
   StatusOr<std::shared_ptr<int>> a = counter;
-  EXPECT_EQ(counter.use_count(), 2);
   {
     StatusOr<std::shared_ptr<int>> b = a;
-    EXPECT_EQ(counter.use_count(), 3);
     StatusOr<std::shared_ptr<int>> c = std::move(b);
-    EXPECT_EQ(counter.use_count(), 3);
     c = AbortedError("x");  // Destroys the held value.
     EXPECT_EQ(counter.use_count(), 2);
     c = a;
+    b = std::move(c);
     EXPECT_EQ(counter.use_count(), 3);
+    b = StatusOr<std::shared_ptr<int>>(DataLossError("d"));
     c.emplace(std::make_shared<int>(1));
     EXPECT_EQ(counter.use_count(), 2);
   }
   EXPECT_EQ(counter.use_count(), 2);
   a = NotFoundError("");
   EXPECT_EQ(counter.use_count(), 1);
+  EXPECT_TRUE(StatusOr<int>(7).status().ok());
 }
 
 TEST(StatusOrTest, Conversions) {
@@ -71,11 +62,9 @@ TEST(StatusOrTest, Conversions) {
   ASSERT_THAT(q, IsOk());
   EXPECT_EQ(**q, 4);
   StatusOr<const char*> text = "abc";
-  StatusOr<std::string> str = text;
-  EXPECT_THAT(str, IsOkAndHolds("abc"));
+  EXPECT_THAT(StatusOr<std::string>(text), IsOkAndHolds("abc"));
   StatusOr<int> err = DataLossError("d");
-  StatusOr<long> err_long = err;
-  EXPECT_THAT(err_long, StatusIs(StatusCode::kDataLoss, "d"));
+  EXPECT_THAT(StatusOr<long>(err), StatusIs(StatusCode::kDataLoss, "d"));
   StatusOr<std::vector<int>> in_place(std::in_place, 3, 9);
   EXPECT_THAT(in_place, IsOkAndHolds(std::vector<int>{9, 9, 9}));
 }
@@ -102,7 +91,6 @@ TEST(StatusMacrosTest, Propagation) {
   EXPECT_THAT(Quarter(6), StatusIs(StatusCode::kInvalidArgument, "odd 3"));
   EXPECT_THAT(CheckQuarter(8), IsOk());
   EXPECT_THAT(CheckQuarter(6), StatusIs(StatusCode::kInvalidArgument, "odd 3; quarter of 6"));
-  EXPECT_THAT(CheckQuarter(5), StatusIs(StatusCode::kInvalidArgument, HasSubstr("odd 5")));
 }
 
 TEST(StatusOrDeathTest, ValueOfErrorIsFatal) {
