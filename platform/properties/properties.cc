@@ -129,7 +129,7 @@ class PropertyStore {
     }
     std::string line;   // the first kMaxSeedLineLength + 1 bytes of the line
     size_t length = 0;  // the whole line's length
-    int number = 0;
+    size_t number = 0;
     char buffer[4096];
     for (;;) {
       const ssize_t n = read(fd, buffer, sizeof(buffer));
@@ -156,7 +156,7 @@ class PropertyStore {
 
   // One line of a seed file: `line` holds at most kMaxSeedLineLength + 1 of
   // its `length` bytes.
-  void SeedLine(const std::string& where, int number, std::string_view line, size_t length) {
+  void SeedLine(const std::string& where, size_t number, std::string_view line, size_t length) {
     const std::string_view text = Trim(line);
     if (!text.empty() && text.front() == '#') return;  // a comment, however long
     const std::string prefix = where + ":" + std::to_string(number) + ": ";
