@@ -125,7 +125,8 @@ TEST(PathDirTest, RecursivelyCreateDir) {
        "INVALID_ARGUMENT: Error creating directory .*/n\\\\x00/x: path contains a NUL byte"},
       {r + "/p/" + std::string(NAME_MAX + 1, 'n') + "/e",
        "INVALID_ARGUMENT: Error creating directory .*/p/n+/e: File name too long"},
-      {too_long, "INVALID_ARGUMENT: Error creating directory " + r + "/d/d/.*: File name too long"}};
+      {too_long, "INVALID_ARGUMENT: Error creating directory " + r + "/d/d/.*: File name too "
+                 "long"}};
   // clang-format on
   const mode_t old_mask = umask(022);
   for (const Case& c : cases) {
