@@ -9,6 +9,8 @@
 #include <cstdint>
 #include <vector>
 
+#include "absl/strings/escaping.h"
+
 namespace orvex {
 namespace {
 
@@ -119,9 +121,15 @@ std::string CleanPath(std::string_view path) {
 // same way, then try the directory once more. The walk up is a loop rather
 // than recursion so that no input can exhaust the stack. A path the kernel
 // can never accept (too long, or with a component longer than NAME_MAX)
-// fails before any of its parents is made.
+// fails before any of its parents is made, and so does one with a NUL byte,
+// which the kernel would silently cut short.
 Status RecursivelyCreateDir(std::string_view path) {
   if (path.empty()) return OkStatus();
+  if (path.find('\0') != std::string_view::npos) {
+    return InvalidArgumentError("Error creating directory " +
+                                absl::CHexEscape(absl::string_view(path.data(), path.size())) +
+                                ": path contains a NUL byte");
+  }
   std::string current = CleanPath(path);
   if (current.size() >= PATH_MAX || HasOverlongComponent(current)) {
     return StatusFromErrno(ENAMETOOLONG, "Error creating directory " + current);

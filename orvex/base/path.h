@@ -53,7 +53,8 @@ ORVEX_EXPORT std::string CleanPath(std::string_view path);
 // the process umask). An empty path, "." and "/" succeed at once, and so
 // does an existing directory. An error is the errno status of the first
 // directory that could not be made, with the message "Error creating
-// directory <path>: <reason>".
+// directory <path>: <reason>". A path with a NUL byte is INVALID_ARGUMENT
+// and nothing is made.
 ORVEX_EXPORT Status RecursivelyCreateDir(std::string_view path);
 
 // Reverses `text` and XORs every byte with one key byte chosen by the

@@ -1,8 +1,11 @@
 #include "cutils/properties.h"
 
 #include <stdlib.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
+#include <filesystem>
 #include <fstream>
 #include <string>
 #include <thread>
@@ -14,6 +17,11 @@
 
 namespace {
 
+using ::testing::AllOf;
+using ::testing::ContainsRegex;
+using ::testing::HasSubstr;
+using ::testing::Not;
+
 std::string Get(const char* key, const char* default_value = nullptr) {
   char value[PROPERTY_VALUE_MAX];
   memset(value, 'x', sizeof(value));
@@ -22,63 +30,52 @@ std::string Get(const char* key, const char* default_value = nullptr) {
   return value;
 }
 
-TEST(HostPropertiesTest, SetGetAndEmptyReadsAsUnset) {
-  EXPECT_EQ(Get("test.props.unset"), "");
-  EXPECT_EQ(Get("test.props.unset", "fallback"), "fallback");
-  ASSERT_EQ(property_set("test.props.a", "value 1"), 0);
-  EXPECT_EQ(Get("test.props.a", "fallback"), "value 1");
-  ASSERT_EQ(property_set("test.props.a", ""), 0);
-  EXPECT_EQ(Get("test.props.a"), "");
-  EXPECT_EQ(Get("test.props.a", "fallback"), "fallback");
-  ASSERT_EQ(property_set("test.props.a", nullptr), 0);
-  EXPECT_EQ(Get("test.props.a", "d"), "d");
-}
-
-TEST(HostPropertiesTest, ValueLengthLimit) {
+// Each row sets a value, then reads it back with the default "d".
+TEST(HostPropertiesTest, SetThenGet) {
   const std::string longest(PROPERTY_VALUE_MAX - 1, 'v');
-  ASSERT_EQ(property_set("test.props.len", longest.c_str()), 0);
-  EXPECT_EQ(Get("test.props.len"), longest);
   const std::string too_long(PROPERTY_VALUE_MAX, 'w');
-  EXPECT_EQ(property_set("test.props.len", too_long.c_str()), -1);
-  EXPECT_EQ(Get("test.props.len"), longest);
-  // A long default is cut to what fits in the caller's buffer.
-  EXPECT_EQ(Get("test.props.len_unset", too_long.c_str()), too_long.substr(0, longest.size()));
-}
-
-TEST(HostPropertiesTest, KeyRules) {
-  for (const char* key : {"", ".a", "a.", "a..b", "a b", "a/b", "a=b", "\xc3\xa9"}) {
-    SCOPED_TRACE(key);
-    EXPECT_EQ(property_set(key, "1"), -1);
+  struct Case {
+    std::string key, value;
+    int result;
+    std::string read;
+  };
+  // clang-format off
+  const Case cases[] = {
+      {"test.props.a", "value 1", 0, "value 1"}, {"test.props.a", "", 0, "d"},  // empty: unset
+      {"test.props.len", longest, 0, longest}, {"test.props.len", too_long, -1, longest},
+      {"ro.test.props.once", "", 0, "d"}, {"ro.test.props.once", "first", 0, "first"},
+      {"ro.test.props.once", "second", -1, "first"}, {"a-b_c@d:e.F9zZA", "1", 0, "1"},
+      {"", "1", -1, "d"}, {".a", "1", -1, "d"}, {"a.", "1", -1, "d"}, {"a..b", "1", -1, "d"},
+      {"a b", "1", -1, "d"}, {"a/b", "1", -1, "d"}, {"a=b", "1", -1, "d"},
+      {"\xc3\xa9", "1", -1, "d"}};
+  // clang-format on
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.key + " = " + c.value);
+    EXPECT_EQ(property_set(c.key.c_str(), c.value.c_str()), c.result);
+    EXPECT_EQ(Get(c.key.c_str(), "d"), c.read);
   }
+  EXPECT_EQ(Get("test.props.unset"), "");
+  // A long default is cut to what fits in the caller's buffer.
+  EXPECT_EQ(Get("test.props.unset", too_long.c_str()), too_long.substr(1));
+  ASSERT_EQ(property_set("test.props.a", "x"), 0);
+  EXPECT_EQ(property_set("test.props.a", nullptr), 0);
+  EXPECT_EQ(Get("test.props.a", "d"), "d");
   EXPECT_EQ(property_set(nullptr, "1"), -1);
   EXPECT_EQ(Get(nullptr, "d"), "d");
-  EXPECT_EQ(property_set("vendor.camera.debug.camera_performance_analyzer.auto_dump_latency", "1"),
-            0);
-  EXPECT_EQ(property_set("a-b_c@d:e.F9", "1"), 0);
-
-  EXPECT_EQ(property_set("ro.test.props.once", ""), 0);
-  EXPECT_EQ(property_set("ro.test.props.once", "first"), 0);
-  EXPECT_EQ(property_set("ro.test.props.once", "second"), -1);
-  EXPECT_EQ(Get("ro.test.props.once"), "first");
+  EXPECT_EQ(property_get_bool(nullptr, 1), 1);
 }
 
+// The first five values read as true, the next five as false, the rest as
+// the default.
 TEST(HostPropertiesTest, GetBool) {
-  struct Case {
-    const char* value;
-    int8_t expected_with_default_0;
-    int8_t expected_with_default_1;
-  };
-  const Case cases[] = {{"1", 1, 1},    {"y", 1, 1},     {"yes", 1, 1},  {"on", 1, 1},
-                        {"true", 1, 1}, {"0", 0, 0},     {"n", 0, 0},    {"no", 0, 0},
-                        {"off", 0, 0},  {"false", 0, 0}, {"TRUE", 0, 1}, {"Yes", 0, 1},
-                        {"2", 0, 1},    {" 1", 0, 1},    {"", 0, 1}};
-  for (const Case& c : cases) {
-    SCOPED_TRACE(c.value);
-    ASSERT_EQ(property_set("test.props.bool", c.value), 0);
-    EXPECT_EQ(property_get_bool("test.props.bool", 0), c.expected_with_default_0);
-    EXPECT_EQ(property_get_bool("test.props.bool", 1), c.expected_with_default_1);
+  const char* const values[] = {"1",   "y",     "yes",  "on",  "true", "0",  "n", "no",
+                                "off", "false", "TRUE", "Yes", "2",    " 1", ""};
+  for (int i = 0; i < 15; ++i) {
+    SCOPED_TRACE(values[i]);
+    ASSERT_EQ(property_set("test.props.bool", values[i]), 0);
+    EXPECT_EQ(property_get_bool("test.props.bool", 0), i < 5 ? 1 : 0);
+    EXPECT_EQ(property_get_bool("test.props.bool", 1), i < 5 || i >= 10 ? 1 : 0);
   }
-  EXPECT_EQ(property_get_bool(nullptr, 1), 1);
 }
 
 TEST(HostPropertiesTest, ConcurrentWritersAndReaders) {
@@ -91,57 +88,88 @@ TEST(HostPropertiesTest, ConcurrentWritersAndReaders) {
         ASSERT_EQ(property_set(key.c_str(), value.c_str()), 0);
         ASSERT_EQ(Get(key.c_str()), value);
         ASSERT_EQ(property_set("test.props.shared", value.c_str()), 0);
-        const std::string shared = Get("test.props.shared");
-        ASSERT_FALSE(shared.empty());
+        ASSERT_FALSE(Get("test.props.shared").empty());
       }
     });
   }
   for (auto& thread : threads) thread.join();
 }
 
-// The store is seeded once, on first use, so seeding runs in a fresh child
-// process where nothing has touched the store yet.
+// Caps the address space a little above what is mapped now, so that an
+// unbounded read fails fast instead of eating the host's memory. Sanitizer
+// runtimes and an emulator reserve far more than they map, so not there.
+void LimitAddressSpace() {
+#if !defined(__SANITIZE_ADDRESS__) && !defined(__SANITIZE_THREAD__)
+  if (getenv("ORVEX_TEST_EXEC_WRAPPER") != nullptr) return;
+  rlim_t pages = 0;
+  std::ifstream("/proc/self/statm") >> pages;
+  const rlim_t bytes = pages * static_cast<rlim_t>(sysconf(_SC_PAGESIZE)) + (8 << 20);
+  const struct rlimit limit = {bytes, bytes};
+  setrlimit(RLIMIT_AS, &limit);
+#endif
+}
+
+// Writes the seed file "seed.prop" and a FIFO "fifo" into `dir`.
+bool WriteSeedFiles(const std::string& dir) {
+  std::ofstream out(dir + "/seed.prop", std::ios::binary);
+  out << "# comment line\n\ntest.seed.plain=hello\n  test.seed.spaced  =  two words  \n"
+      << "test.seed.empty=\ntest.seed.equals=a=b\nno equals sign here\nbad..key=1\n"
+      << "test.seed.long=" << std::string(PROPERTY_VALUE_MAX, 'z') << "\n"
+      << std::string("test.seed.nul=a\0b\n", 18) << "\x1b[2J\x7ftest.seed.esc=1\n"
+      << "test.seed.huge=" << std::string(16 << 20, 'h') << "\n#" << std::string(1 << 20, 'c')
+      << "\ntest.seed.edge=1" << std::string(1008, ' ')  // 1024 bytes: the longest taken
+      << "\ntest.seed.last=1";
+  out.close();
+  return out && mkfifo((dir + "/fifo").c_str(), 0600) == 0;
+}
+
+// The store is seeded once, on first use, so each source is read in a fresh
+// child process, under a time and a memory bound.
 TEST(HostPropertiesDeathTest, SeedsFromFileNamedByEnvironment) {
   orvex_testing::UseReexecDeathTests();
-  std::string dir = ::testing::TempDir() + "orvex_props_XXXXXX";
-  ASSERT_NE(mkdtemp(dir.data()), nullptr);
-  const std::string path = dir + "/seed.prop";
-  {
-    std::ofstream out(path);
-    out << "# comment line\n"
-        << "\n"
-        << "test.seed.plain=hello\n"
-        << "  test.seed.spaced  =  two words  \n"
-        << "test.seed.empty=\n"
-        << "test.seed.equals=a=b\n"
-        << "no equals sign here\n"
-        << "bad..key=1\n"
-        << "test.seed.long=" << std::string(PROPERTY_VALUE_MAX, 'z') << "\n"
-        << "persist.vendor.camera.fatp.enable=true\n"
-        << "test.seed.last=1";
+  const auto refused = HasSubstr(" named by ORVEX_PROPERTIES_FILE is not a regular file; ignored");
+  struct Case {
+    std::string file;  // relative to a scratch directory
+    ::testing::Matcher<const std::string&> log;
+  };
+  const Case cases[] = {
+      {"seed.prop",
+       AllOf(HasSubstr("seed.prop:7: ignored property line: no equals sign here\n"),
+             HasSubstr("seed.prop:8: ignored property line: bad..key=1\n"),
+             ContainsRegex("seed.prop:9: ignored property line: test.seed.long=z{65}\\.\\.\\.\n"),
+             HasSubstr(
+                 "seed.prop:10: ignored property line with a NUL byte: test.seed.nul=a\\x00b\n"),
+             HasSubstr("seed.prop:11: ignored property line: \\x1b[2J\\x7ftest.seed.esc=1\n"),
+             ContainsRegex("seed.prop:12: ignored property line of 16777231 bytes .*: "
+                           "test.seed.huge=h{65}\\.\\.\\.\n"),
+             Not(HasSubstr(":13:")), Not(HasSubstr(":14:")), Not(HasSubstr("read error")),
+             Not(HasSubstr("\x1b")))},
+      {"missing", ContainsRegex("cannot read property file .*/missing named by")},
+      {"fifo", refused},
+      {"/dev/zero", refused},
+      {".", refused}};
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.file);
+    EXPECT_EXIT(
+        {
+          std::string dir = ::testing::TempDir() + "orvex_props_XXXXXX";
+          if (mkdtemp(dir.data()) == nullptr || !WriteSeedFiles(dir)) _exit(2);
+          alarm(30);
+          LimitAddressSpace();
+          const std::string file = c.file.front() == '/' ? c.file : dir + "/" + c.file;
+          setenv("ORVEX_PROPERTIES_FILE", file.c_str(), 1);
+          std::string values;
+          for (const char* key :
+               {"plain", "spaced", "empty", "equals", "long", "nul", "huge", "edge", "last"}) {
+            values += Get((std::string("test.seed.") + key).c_str()) + "|";
+          }
+          const bool ok =
+              values == (c.file == "seed.prop" ? "hello|two words||a=b||||1|1|" : "|||||||||");
+          std::filesystem::remove_all(dir);
+          _exit(ok ? 0 : 1);
+        },
+        ::testing::ExitedWithCode(0), c.log);
   }
-  EXPECT_EXIT(
-      {
-        setenv("ORVEX_PROPERTIES_FILE", path.c_str(), 1);
-        const bool ok = Get("test.seed.plain") == "hello" &&
-                        Get("test.seed.spaced") == "two words" &&
-                        Get("test.seed.empty", "d") == "d" && Get("test.seed.equals") == "a=b" &&
-                        Get("test.seed.long").empty() &&
-                        property_get_bool("persist.vendor.camera.fatp.enable", 0) == 1 &&
-                        Get("test.seed.last") == "1";
-        _exit(ok ? 0 : 1);
-      },
-      ::testing::ExitedWithCode(0),
-      "seed.prop:7: ignored property line: no equals sign here(.|\n)*"
-      "seed.prop:8: ignored property line: bad..key=1(.|\n)*seed.prop:9: ignored");
-  EXPECT_EXIT(
-      {
-        setenv("ORVEX_PROPERTIES_FILE", (path + ".missing").c_str(), 1);
-        _exit(Get("test.seed.plain").empty() ? 0 : 1);
-      },
-      ::testing::ExitedWithCode(0), "cannot read property file .*seed.prop.missing");
-  unlink(path.c_str());
-  rmdir(dir.c_str());
 }
 
 }  // namespace

@@ -182,7 +182,10 @@ Status CameraLatencyAnalyzer::WriteProtoToDisk(std::string_view prefix) const {
 
 Status CameraLatencyAnalyzer::WriteProtoToDisk(std::string_view prefix,
                                                std::string* written_path) const {
-  const std::string directory = output_directory();
+  // The directory is made in its clean form, so the file must go through
+  // that same form: with a symbolic link before a "..", the kernel resolves
+  // the raw path to somewhere else.
+  const std::string directory = CleanPath(output_directory());
   Status status = RecursivelyCreateDir(directory);
   if (!status.ok()) return status;
 

@@ -31,7 +31,9 @@
 //
 // Output directory: "/data/vendor/camera/profiler" unless the environment
 // variable ORVEX_PROFILER_DIR names another one when the analyzer is first
-// used, or SetOutputDirectory() chooses another (tests, host runs).
+// used, or SetOutputDirectory() chooses another (tests, host runs). The
+// directory is used in its CleanPath form: "." and ".." are resolved
+// lexically, before any symbolic link, both to make it and to write in it.
 //
 // Log lines carry the prefix "[CPA]".
 //
