@@ -31,7 +31,7 @@ TEST(AfbcSizeUtilsTest, GeometryFollowsModifierBits) {
       // 32x8 tiled: heights to 64, header rows of 8.
       {Code(0xd0023), 100, 100, 256, 128, 8, 16, 4096},
       // 64x4 untiled; wide wins over extra-wide.
-      {Code(0x110023), 100, 6, 128, 8, 2, 2, 1024},
+      {Code(0x110023), 100, 4, 128, 4, 2, 1, 1024},
       {Code(0x150023), 100, 6, 128, 16, 4, 2, 1024},
   };
   for (const Case& c : cases) {

@@ -391,7 +391,8 @@ TEST(ImageFormatTest, FailuresNameTheFirstBrokenRule) {
        "64, Height: 32}; " +
            Prefix("Y16")},
       {MakeOrDie(2, 2, F::Y10), F::Y10, Prefix("Y10") + "stride must be multiple of 10"},
-      {MakeOrDie(100, 100, F::BLOB), F::YCBCR_420_888,
+      // Luma, Cb and a compressed luma payload: neither kind of YUV layout.
+      {Set(yuv, 2, &C::content, CC::kCompressedLumaPayload), F::YCBCR_420_888,
        "Imageformat does not have required components for either compressed or uncompressed "
        "YUV" +
            in420},
