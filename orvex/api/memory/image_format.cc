@@ -7,6 +7,7 @@
 
 #include "orvex/api/math/size_utils.h"
 #include "orvex/api/memory/afbc_size_utils.h"
+#include "orvex/api/memory/hal_pixel_format_internal.h"
 #include "orvex/api/memory/sbwc_size_utils.h"
 #include "orvex/status/status_builder.h"
 
@@ -17,164 +18,59 @@ using Content = ImageFormat::ComponentContent;
 using Subsampling = ImageFormat::ChromaSubsampling;
 using Order = ImageFormat::InterleavedChromaOrder;
 using F = HalPixelFormat;
+using hal_pixel_format_internal::ChromaOrder;
+using hal_pixel_format_internal::FindFormatTraits;
+using hal_pixel_format_internal::FormatTraits;
+using hal_pixel_format_internal::Layout;
+using hal_pixel_format_internal::Rules;
 
-// Layout families of Make.
-enum class Family {
-  kSemiPlanar420,
-  kYv12,
-  kInterleaved422,
-  kMonochrome,
-  kRawBayer,
-  kBlob,
-  kSbwcBayerLossless,
-  kSbwcBayerLossy,
-  kSbwcYuvLossless,
-  kSbwcYuvLossy,
-  kAfbcWideBlock,
-  kAfbcExtraWideBlock,
+struct DimensionMultiples {
+  int width;
+  int height;
 };
 
-std::optional<Family> FamilyOf(HalPixelFormat format) {
-  switch (format) {
-    case F::YCBCR_420_888:
-    case F::YCBCR_P010:
-    case F::YCBCR_420_SP_M:
-    case F::YCBCR_420_SP_M_S10B:
-    case F::YCBCR_P010_M:
-    case F::YCBCR_420_888_SINGLE_BUFFER:
-    case F::YCBCR_420_888_STRIDE_ALIGNED_64:
-    case F::YCBCR_420_SP_M_STRIDE_ALIGNED_64:
-    case F::YCBCR_420_SP_M_S10B_STRIDE_ALIGNED_64:
-    case F::YCBCR_420_888_SINGLE_BUFFER_STRIDE_ALIGNED_64:
-    case F::YCBCR_P010_M_STRIDE_ALIGNED_64:
-      return Family::kSemiPlanar420;
-    case F::YV12:
-      return Family::kYv12;
-    case F::YCBCR_422_I:
-      return Family::kInterleaved422;
-    case F::Y8:
-    case F::Y16:
-    case F::Y10:
-      return Family::kMonochrome;
-    case F::RAW16:
-    case F::RAW10:
-    case F::RAW12:
-      return Family::kRawBayer;
-    case F::BLOB:
-      return Family::kBlob;
-    case F::RAW16_BAYER_SBWC:
-      return Family::kSbwcBayerLossless;
-    case F::RAW16_BAYER_SBWC_L50:
-    case F::RAW16_BAYER_SBWC_L75:
-      return Family::kSbwcBayerLossy;
-    case F::YCBCR_420_SP_M_SBWC:
-    case F::YCBCR_420_SP_M_S10B_SBWC:
-    case F::YCRCB_420_SP_M_SBWC:
-    case F::YCBCR_420_SP_M_SBWC_STRIDE_ALIGNED_64:
-    case F::YCBCR_420_SP_M_S10B_SBWC_STRIDE_ALIGNED_64:
-      return Family::kSbwcYuvLossless;
-    case F::YCBCR_420_SP_M_SBWC_L50:
-    case F::YCBCR_420_SP_M_SBWC_L75:
-    case F::YCBCR_420_SP_M_S10B_SBWC_L40:
-    case F::YCBCR_420_SP_M_S10B_SBWC_L60:
-    case F::YCBCR_420_SP_M_S10B_SBWC_L80:
-    case F::YCBCR_420_SP_M_SBWC_L50_STRIDE_ALIGNED_64:
-    case F::YCBCR_420_SP_M_S10B_SBWC_L40_STRIDE_ALIGNED_64:
-    case F::YCBCR_420_SP_M_S10B_SBWC_L80_STRIDE_ALIGNED_64:
-      return Family::kSbwcYuvLossy;
-    case F::YCBCR_420_888_I_AFBC_WIDEBLK:
-      return Family::kAfbcWideBlock;
-    case F::YCBCR_420_888_AFBC_EXTRAWIDEBLK:
-      return Family::kAfbcExtraWideBlock;
+DimensionMultiples DimensionMultiplesOf(Layout layout, int bpp) {
+  switch (layout) {
+    case Layout::kYv12:
+      return {4, 2};
+    case Layout::kInterleaved422:
+      return {2, 1};
+    case Layout::kRawBayer:
+      // Packed RAW10 and RAW12 rows hold whole groups of four samples.
+      return {bpp == 16 ? 2 : 4, 1};
+    case Layout::kBlob:  // any size
+      return {1, 1};
     default:
-      return std::nullopt;
+      return {2, 2};
   }
 }
 
-// Lossy SBWC YUV parameters: compression ratio and payload alignment.
-struct LossyYuvParams {
-  int ratio;
-  int alignment;
-};
-
-LossyYuvParams LossyYuvParamsOf(HalPixelFormat format) {
-  switch (format) {
-    case F::YCBCR_420_SP_M_SBWC_L50:
-      return {50, 32};
-    case F::YCBCR_420_SP_M_SBWC_L75:
-      return {75, 32};
-    case F::YCBCR_420_SP_M_S10B_SBWC_L40:
-      return {40, 32};
-    case F::YCBCR_420_SP_M_S10B_SBWC_L60:
-      return {60, 32};
-    case F::YCBCR_420_SP_M_S10B_SBWC_L80:
-      return {80, 32};
-    case F::YCBCR_420_SP_M_SBWC_L50_STRIDE_ALIGNED_64:
-      return {50, 64};
-    case F::YCBCR_420_SP_M_S10B_SBWC_L40_STRIDE_ALIGNED_64:
-      return {40, 64};
-    default:  // YCBCR_420_SP_M_S10B_SBWC_L80_STRIDE_ALIGNED_64
-      return {80, 64};
-  }
-}
-
-struct FamilyRules {
-  int width_multiple;
-  int height_multiple;
-  bool accepts_order;
-};
-
-FamilyRules RulesOf(Family family, HalPixelFormat format) {
-  switch (family) {
-    case Family::kSemiPlanar420:
-      return {2, 2, true};
-    case Family::kYv12:
-      return {4, 2, false};
-    case Family::kInterleaved422:
-      return {2, 1, true};
-    case Family::kMonochrome:
-      return {2, 2, false};
-    case Family::kRawBayer:
-      return {format == F::RAW16 ? 2 : 4, 1, false};
-    case Family::kBlob:
-      return {1, 1, false};
-    case Family::kSbwcBayerLossless:
-    case Family::kSbwcBayerLossy:
-      return {2, 2, false};
-    case Family::kSbwcYuvLossless:
-    case Family::kSbwcYuvLossy:
-    case Family::kAfbcWideBlock:
-    case Family::kAfbcExtraWideBlock:
-      return {2, 2, true};
-  }
-  return {2, 2, false};
-}
-
-std::string DimensionMessage(Family family, HalPixelFormat format, int bpp) {
-  switch (family) {
-    case Family::kSemiPlanar420:
+std::string DimensionMessage(Layout layout, HalPixelFormat format, int bpp) {
+  switch (layout) {
+    case Layout::kSemiPlanar420:
       return "YCBCR_420_888 dimension requirements not met";
-    case Family::kYv12:
+    case Layout::kYv12:
       return "YV12 dimension requirements not met";
-    case Family::kInterleaved422:
+    case Layout::kInterleaved422:
       return "YCBCR_422_I dimension requirements not met";
-    case Family::kMonochrome:
+    case Layout::kMonochrome:
       return "Monochrome format dimension requirements not met";
-    case Family::kRawBayer:
+    case Layout::kRawBayer:
       return "Dimension requirements not met for RAW" + std::to_string(bpp);
-    case Family::kBlob:
-      return "";
-    case Family::kSbwcBayerLossless:
+    case Layout::kSbwcBayerLossless:
       return "RAW16_BAYER_SBWC dimension requirements not met";
-    case Family::kSbwcYuvLossless:
+    case Layout::kSbwcYuvLossless:
       return "YCBCR_420_SP_M_SBWC dimension requirements not met";
-    case Family::kSbwcBayerLossy:
-    case Family::kSbwcYuvLossy:
+    case Layout::kSbwcBayerLossy:
+    case Layout::kSbwcYuvLossy:
       return FormatToString(format) + " dimension requirements not met";
-    case Family::kAfbcWideBlock:
+    case Layout::kAfbcWideBlock:
       return "YCBCR_420_888_I_AFBC dimension requirements not met";
-    case Family::kAfbcExtraWideBlock:
+    case Layout::kAfbcExtraWideBlock:
       return "YCBCR_420_888_AFBC dimension requirements not met";
+    case Layout::kNone:
+    case Layout::kBlob:  // takes any size
+      break;
   }
   return "";
 }
@@ -226,8 +122,6 @@ struct Draft {
   std::array<DraftComponent, 4> components{};
   int component_count = 0;
   std::optional<Subsampling> chroma_subsampling;
-  // Order used when Make is given none; empty for formats without one.
-  std::optional<Order> default_order;
 
   void AddBuffer(uint64_t size) { buffer_sizes[static_cast<size_t>(buffer_count++)] = size; }
   void Add(const DraftComponent& c) { components[static_cast<size_t>(component_count++)] = c; }
@@ -237,29 +131,20 @@ constexpr uint64_t U(int64_t v) { return static_cast<uint64_t>(v); }
 
 int64_t AlignUp(int64_t value, size_t alignment) { return AlignToPower2Signed(value, alignment); }
 
-bool IsOneOf(HalPixelFormat format, std::initializer_list<HalPixelFormat> formats) {
-  for (const HalPixelFormat f : formats) {
-    if (f == format) return true;
-  }
-  return false;
+// Row stride of an uncompressed plane: `bpp` bits per sample, padded to
+// `alignment` bytes (1: packed rows, which skip the call).
+int64_t RowStride(int64_t w, int bpp, int alignment) {
+  const int64_t bytes = (bpp * w) / 8;
+  return alignment == 1 ? bytes : AlignUp(bytes, static_cast<size_t>(alignment));
 }
 
-void LayOutSemiPlanar420(HalPixelFormat format, int64_t w, int64_t h, int bpp, Draft& d) {
-  int64_t stride = AlignUp((bpp * w) / 8, 16);
-  if (IsOneOf(format, {F::YCBCR_420_888_STRIDE_ALIGNED_64, F::YCBCR_420_SP_M_STRIDE_ALIGNED_64,
-                       F::YCBCR_420_SP_M_S10B_STRIDE_ALIGNED_64,
-                       F::YCBCR_420_888_SINGLE_BUFFER_STRIDE_ALIGNED_64,
-                       F::YCBCR_P010_M_STRIDE_ALIGNED_64})) {
-    stride = AlignUp(stride, 64);
-  } else if (format == F::YCBCR_P010_M) {
-    stride = AlignUp(stride, 32);
-  }
+void LayOutSemiPlanar420(const FormatTraits& t, int64_t w, int64_t h, int bpp, Draft& d) {
+  const int64_t stride = RowStride(w, bpp, t.alignment);
   const uint64_t luma_size = U(h) * U(stride);
   const uint64_t chroma_size = luma_size / 2;
   int chroma_buffer = 1;
   uint64_t chroma_offset = 0;
-  if (IsOneOf(format, {F::YCBCR_P010, F::YCBCR_420_888_SINGLE_BUFFER,
-                       F::YCBCR_420_888_SINGLE_BUFFER_STRIDE_ALIGNED_64})) {
+  if (t.single_buffer) {
     d.AddBuffer(luma_size + chroma_size);
     chroma_buffer = 0;
     chroma_offset = luma_size;
@@ -267,11 +152,6 @@ void LayOutSemiPlanar420(HalPixelFormat format, int64_t w, int64_t h, int bpp, D
     d.AddBuffer(luma_size);
     d.AddBuffer(chroma_size);
   }
-  d.default_order =
-      IsOneOf(format, {F::YCBCR_P010, F::YCBCR_420_SP_M, F::YCBCR_P010_M,
-                       F::YCBCR_420_SP_M_STRIDE_ALIGNED_64, F::YCBCR_P010_M_STRIDE_ALIGNED_64})
-          ? Order::kCbCr
-          : Order::kCrCb;
   d.Add({Content::kLuma, 0, 0, w, h, stride, bpp, 1, 0});
   // Phases are fixed in Make once the order is known.
   d.Add({Content::kChromaB, chroma_buffer, chroma_offset, w / 2, h / 2, stride, bpp, 2, 0});
@@ -279,45 +159,34 @@ void LayOutSemiPlanar420(HalPixelFormat format, int64_t w, int64_t h, int bpp, D
   d.chroma_subsampling = Subsampling::k420;
 }
 
-void LayOutYv12(int64_t w, int64_t h, Draft& d) {
-  const int64_t luma_stride = AlignUp(w, 16);
-  const int64_t chroma_stride = AlignUp(luma_stride / 2, 16);
+void LayOutYv12(const FormatTraits& t, int64_t w, int64_t h, int bpp, Draft& d) {
+  const int64_t luma_stride = RowStride(w, bpp, t.alignment);
+  const int64_t chroma_stride = AlignUp(luma_stride / 2, static_cast<size_t>(t.alignment));
   const uint64_t luma_size = U(h) * U(luma_stride);
   const uint64_t chroma_size = (U(h) * U(chroma_stride)) / 2;
   d.AddBuffer(luma_size + 2 * chroma_size);
-  d.Add({Content::kLuma, 0, 0, w, h, luma_stride, 8});
-  d.Add({Content::kChromaR, 0, luma_size, w / 2, h / 2, chroma_stride, 8});
-  d.Add({Content::kChromaB, 0, luma_size + chroma_size, w / 2, h / 2, chroma_stride, 8});
+  d.Add({Content::kLuma, 0, 0, w, h, luma_stride, bpp});
+  d.Add({Content::kChromaR, 0, luma_size, w / 2, h / 2, chroma_stride, bpp});
+  d.Add({Content::kChromaB, 0, luma_size + chroma_size, w / 2, h / 2, chroma_stride, bpp});
   d.chroma_subsampling = Subsampling::k420;
 }
 
-void LayOutInterleaved422(int64_t w, int64_t h, int bpp, Draft& d) {
-  const int64_t stride = AlignUp(2 * w, 16);
+// Y0 Cb Y1 Cr: two samples per pixel.
+void LayOutInterleaved422(const FormatTraits& t, int64_t w, int64_t h, int bpp, Draft& d) {
+  const int64_t stride = RowStride(2 * w, bpp, t.alignment);
   d.AddBuffer(U(h) * U(stride));
   d.Add({Content::kLuma, 0, 0, w, h, stride, bpp, 2, 0});
   d.Add({Content::kChromaB, 0, 0, w / 2, h, stride, bpp, 4, 1});
   d.Add({Content::kChromaR, 0, 0, w / 2, h, stride, bpp, 4, 3});
   d.chroma_subsampling = Subsampling::k422;
-  d.default_order = Order::kCrCb;
 }
 
-void LayOutMonochrome(HalPixelFormat format, int64_t w, int64_t h, int bpp, Draft& d) {
-  int64_t stride = 0;
-  if (format == F::Y8) {
-    stride = AlignUp(w, 16);
-  } else if (format == F::Y16) {
-    stride = AlignUp(2 * w, 32);
-  } else {  // Y10: packed, four samples in five bytes
-    stride = (5 * w) / 4;
-  }
+// Monochrome and raw Bayer: one plane of one component.
+void LayOutSinglePlane(const FormatTraits& t, Content content, int64_t w, int64_t h, int bpp,
+                       Draft& d) {
+  const int64_t stride = RowStride(w, bpp, t.alignment);
   d.AddBuffer(U(h) * U(stride));
-  d.Add({Content::kLuma, 0, 0, w, h, stride, bpp, 1, 0});
-}
-
-void LayOutRawBayer(int64_t w, int64_t h, int bpp, Draft& d) {
-  const int64_t stride = (bpp * w) / 8;
-  d.AddBuffer(U(h) * U(stride));
-  d.Add({Content::kBayer, 0, 0, w, h, stride, bpp, 1, 0});
+  d.Add({content, 0, 0, w, h, stride, bpp, 1, 0});
 }
 
 void LayOutBlob(int64_t w, int64_t h, Draft& d) {
@@ -325,31 +194,30 @@ void LayOutBlob(int64_t w, int64_t h, Draft& d) {
   d.Add({Content::kUnspecified, 0, 0, w, h, w, 8, 1, 0});
 }
 
-void LayOutSbwcBayerLossless(int width, int64_t h, int bpp, Draft& d) {
+void LayOutSbwcBayerLossless(const FormatTraits& t, int width, int64_t h, int bpp, Draft& d) {
+  const auto alignment = static_cast<size_t>(t.alignment);
   const int64_t blocks = CeilDiv(width, 256);
-  // Half a byte of header per 256x1 block, rows padded to 64 bytes.
-  const int64_t header_stride = AlignUp(CeilDiv(blocks, 2), 64);
+  // Half a byte of header per 256x1 block, rows padded to the alignment.
+  const int64_t header_stride = AlignUp(CeilDiv(blocks, 2), alignment);
   const uint64_t header_size = U(header_stride) * U(h);
   const auto payload_stride =
-      static_cast<int64_t>(sbwc_size_utils::GetPayloadStride<256, 1>(width, bpp, 64));
+      static_cast<int64_t>(sbwc_size_utils::GetPayloadStride<256, 1>(width, bpp, t.alignment));
   d.AddBuffer(header_size + U(payload_stride) * U(h));
   d.Add({Content::kCompressedBayerHeader, 0, 0, header_stride, h, header_stride, bpp});
   d.Add({Content::kCompressedBayerPayload, 0, header_size, payload_stride, h, payload_stride, bpp});
 }
 
-void LayOutSbwcBayerLossy(HalPixelFormat format, int width, int64_t h, int bpp, Draft& d) {
-  const int ratio = format == F::RAW16_BAYER_SBWC_L50 ? 50 : 75;
-  const int64_t stride = sbwc_size_utils::detail::LossyBayerPayloadStride(width, bpp, 32, ratio);
+void LayOutSbwcBayerLossy(const FormatTraits& t, int width, int64_t h, int bpp, Draft& d) {
+  const int64_t stride = sbwc_size_utils::detail::LossyBayerPayloadStride(width, bpp, t.alignment,
+                                                                          t.compression_ratio);
   d.AddBuffer(U(stride) * U(h));
   d.Add({Content::kCompressedBayerPayload, 0, 0, stride, h, stride, bpp});
 }
 
-void LayOutSbwcYuvLossless(HalPixelFormat format, int width, int height, int bpp, Draft& d) {
+void LayOutSbwcYuvLossless(const FormatTraits& t, int width, int height, int bpp, Draft& d) {
   const int64_t w = width;
   const int64_t h = height;
-  const bool aligned_64 = format == F::YCBCR_420_SP_M_SBWC_STRIDE_ALIGNED_64 ||
-                          format == F::YCBCR_420_SP_M_S10B_SBWC_STRIDE_ALIGNED_64;
-  const int header_alignment = aligned_64 ? 64 : 16;
+  const int header_alignment = t.alignment;
   const bool ten_bit = bpp == 10;
   // Blocks of 32x4 luma samples.
   const int64_t header_stride = AlignUp(CeilDiv(w, 64), static_cast<size_t>(header_alignment));
@@ -372,20 +240,17 @@ void LayOutSbwcYuvLossless(HalPixelFormat format, int width, int height, int bpp
   d.Add(
       {Content::kCompressedChromaPayload, 1, 0, payload_stride, chroma_rows, payload_stride, bpp});
   d.chroma_subsampling = Subsampling::k420;
-  d.default_order = Order::kCbCr;
 }
 
-void LayOutSbwcYuvLossy(HalPixelFormat format, int width, int64_t h, int bpp, Draft& d) {
-  const LossyYuvParams params = LossyYuvParamsOf(format);
+void LayOutSbwcYuvLossy(const FormatTraits& t, int width, int64_t h, int bpp, Draft& d) {
   const int64_t stride =
-      sbwc_size_utils::detail::LossyYuvPayloadStride(width, bpp, params.alignment, params.ratio);
+      sbwc_size_utils::detail::LossyYuvPayloadStride(width, bpp, t.alignment, t.compression_ratio);
   const int64_t rows = AlignUp(h, 16);
   d.AddBuffer(U(stride) * U(rows / 4) + 64);
   d.AddBuffer(U(stride) * U(rows / 8) + 64);
   d.Add({Content::kCompressedLumaPayload, 0, 0, stride, CeilDiv(h, 4), stride, bpp});
   d.Add({Content::kCompressedChromaPayload, 1, 0, stride, CeilDiv(h / 2, 4), stride, bpp});
   d.chroma_subsampling = Subsampling::k420;
-  d.default_order = Order::kCbCr;
 }
 
 // Header and payload geometry of one AFBC plane.
@@ -425,7 +290,6 @@ void LayOutAfbcWideBlock(HalPixelFormat format, int64_t w, int64_t h, int bpp, D
   d.Add({Content::kCompressedChromaPayload, 0, p.header_size, p.payload_width / 2,
          p.payload_height / 2, p.payload_stride, bpp});
   d.chroma_subsampling = Subsampling::k420;
-  d.default_order = Order::kCrCb;
 }
 
 // Luma plane in buffer 0, interleaved chroma plane (a Cb-Cr pair counts as
@@ -447,7 +311,6 @@ void LayOutAfbcExtraWideBlock(HalPixelFormat format, int64_t w, int64_t h, int b
   d.Add({Content::kCompressedChromaPayload, 1, chroma.header_size, chroma.payload_width,
          chroma.payload_height, chroma.payload_stride, bpp});
   d.chroma_subsampling = Subsampling::k420;
-  d.default_order = Order::kCrCb;
 }
 
 bool FitsInt(int64_t v) { return v >= INT_MIN && v <= INT_MAX; }
@@ -474,28 +337,27 @@ StatusOr<ImageFormat> ImageFormat::Make(
   } else if (format == F::IMPLEMENTATION_DEFINED_64) {
     format = F::YCBCR_420_888_STRIDE_ALIGNED_64;
   }
-  const int bpp = BitsPerPixel(format);
-  const std::optional<Family> family = FamilyOf(format);
-  if (!family.has_value()) {
+  const FormatTraits* traits = FindFormatTraits(format);
+  if (traits == nullptr || traits->layout == Layout::kNone) {
     return UnimplementedErrorBuilder(ORVEX_LOC)
            << "Unsupported HalPixelFormat: " << FormatToString(format)
            << ", unable to make ImageFormat.";
   }
-  if (*family == Family::kInterleaved422 && interleaved_chroma_order.has_value() &&
+  const FormatTraits& t = *traits;
+  const int bpp = t.bits_per_pixel;
+  if (t.layout == Layout::kInterleaved422 && interleaved_chroma_order.has_value() &&
       *interleaved_chroma_order != Order::kCrCb) {
     return UnimplementedErrorBuilder(ORVEX_LOC)
            << "Unsupported interleaved chroma order: "
            << InterleavedChromaOrderToString(*interleaved_chroma_order)
            << " for HalPixelFormat: YCBCR_422_I, unable to make ImageFormat.";
   }
-  const FamilyRules rules = RulesOf(*family, format);
-  if (*family != Family::kBlob) {
-    Status dimensions = CheckDimensionsValid(width, height, rules.width_multiple,
-                                             rules.height_multiple, /*verbose=*/true);
-    if (!dimensions.ok()) {
-      return StatusBuilder(std::move(dimensions), ORVEX_LOC)
-             << DimensionMessage(*family, format, bpp);
-    }
+  const DimensionMultiples multiples = DimensionMultiplesOf(t.layout, bpp);
+  Status dimensions =
+      CheckDimensionsValid(width, height, multiples.width, multiples.height, /*verbose=*/true);
+  if (!dimensions.ok()) {
+    return StatusBuilder(std::move(dimensions), ORVEX_LOC)
+           << DimensionMessage(t.layout, format, bpp);
   }
   // Negative sizes would give negative strides and wrapped buffer sizes.
   if (width < 0 || height < 0) {
@@ -508,41 +370,42 @@ StatusOr<ImageFormat> ImageFormat::Make(
   Draft d;
   const int64_t w = width;
   const int64_t h = height;
-  switch (*family) {
-    case Family::kSemiPlanar420:
-      LayOutSemiPlanar420(format, w, h, bpp, d);
+  switch (t.layout) {
+    case Layout::kNone:  // refused above
       break;
-    case Family::kYv12:
-      LayOutYv12(w, h, d);
+    case Layout::kSemiPlanar420:
+      LayOutSemiPlanar420(t, w, h, bpp, d);
       break;
-    case Family::kInterleaved422:
-      LayOutInterleaved422(w, h, bpp, d);
+    case Layout::kYv12:
+      LayOutYv12(t, w, h, bpp, d);
       break;
-    case Family::kMonochrome:
-      LayOutMonochrome(format, w, h, bpp, d);
+    case Layout::kInterleaved422:
+      LayOutInterleaved422(t, w, h, bpp, d);
       break;
-    case Family::kRawBayer:
-      LayOutRawBayer(w, h, bpp, d);
+    case Layout::kMonochrome:
+    case Layout::kRawBayer:
+      LayOutSinglePlane(t, t.layout == Layout::kRawBayer ? Content::kBayer : Content::kLuma, w, h,
+                        bpp, d);
       break;
-    case Family::kBlob:
+    case Layout::kBlob:
       LayOutBlob(w, h, d);
       break;
-    case Family::kSbwcBayerLossless:
-      LayOutSbwcBayerLossless(width, h, bpp, d);
+    case Layout::kSbwcBayerLossless:
+      LayOutSbwcBayerLossless(t, width, h, bpp, d);
       break;
-    case Family::kSbwcBayerLossy:
-      LayOutSbwcBayerLossy(format, width, h, bpp, d);
+    case Layout::kSbwcBayerLossy:
+      LayOutSbwcBayerLossy(t, width, h, bpp, d);
       break;
-    case Family::kSbwcYuvLossless:
-      LayOutSbwcYuvLossless(format, width, height, bpp, d);
+    case Layout::kSbwcYuvLossless:
+      LayOutSbwcYuvLossless(t, width, height, bpp, d);
       break;
-    case Family::kSbwcYuvLossy:
-      LayOutSbwcYuvLossy(format, width, h, bpp, d);
+    case Layout::kSbwcYuvLossy:
+      LayOutSbwcYuvLossy(t, width, h, bpp, d);
       break;
-    case Family::kAfbcWideBlock:
+    case Layout::kAfbcWideBlock:
       LayOutAfbcWideBlock(format, w, h, bpp, d);
       break;
-    case Family::kAfbcExtraWideBlock:
+    case Layout::kAfbcExtraWideBlock:
       LayOutAfbcExtraWideBlock(format, w, h, bpp, d);
       break;
   }
@@ -566,14 +429,16 @@ StatusOr<ImageFormat> ImageFormat::Make(
   }
 
   std::optional<Order> order;
-  if (rules.accepts_order) {
-    order = interleaved_chroma_order.has_value() ? interleaved_chroma_order : d.default_order;
+  if (t.chroma_order != ChromaOrder::kNone) {
+    order = interleaved_chroma_order.has_value()
+                ? *interleaved_chroma_order
+                : (t.chroma_order == ChromaOrder::kCbCr ? Order::kCbCr : Order::kCrCb);
   } else if (interleaved_chroma_order.has_value()) {
     return InvalidArgumentErrorBuilder(ORVEX_LOC)
            << "Specifying interleaved pixel order for format: " << FormatToString(format)
            << " is not supported";
   }
-  if (*family == Family::kSemiPlanar420) {
+  if (t.layout == Layout::kSemiPlanar420) {
     // An order value that is no enumerator counts as kCrCb, as it does for
     // its text and for the conformance check.
     const bool cb_first = order == Order::kCbCr;
@@ -829,90 +694,11 @@ Status ImageFormat::ConformsTo(ChromaSubsampling expected, bool verbose) const {
   return OkStatus();
 }
 
-namespace {
-
-// Conformance rule sets, by target.
-enum class RuleSet {
-  kNone,
-  kImplementationDefined,
-  kBlob,
-  kRaw,
-  kMonochrome,
-  kSemiPlanar420,
-  kYv12,
-  kInterleaved422,
-  kSbwcBayerLossless,
-  kSbwcBayerLossy,
-  kSbwcYuvLossless,
-  kSbwcYuvLossy,
-  kAfbcExtraWideBlock,
-  kAfbcWideBlock,
-};
-
-RuleSet RuleSetOf(HalPixelFormat target) {
-  switch (target) {
-    case F::IMPLEMENTATION_DEFINED:
-      return RuleSet::kImplementationDefined;
-    case F::BLOB:
-      return RuleSet::kBlob;
-    case F::RAW16:
-    case F::RAW10:
-    case F::RAW12:
-      return RuleSet::kRaw;
-    case F::Y8:
-    case F::Y16:
-    case F::Y10:
-      return RuleSet::kMonochrome;
-    case F::YCBCR_420_888:
-    case F::YCBCR_P010:
-    case F::YCBCR_420_SP_M_S10B:
-    case F::YCBCR_P010_M:
-    case F::YCBCR_420_888_SINGLE_BUFFER:
-    case F::YCBCR_420_888_STRIDE_ALIGNED_64:
-    case F::YCBCR_420_SP_M_STRIDE_ALIGNED_64:
-    case F::YCBCR_420_SP_M_S10B_STRIDE_ALIGNED_64:
-    case F::YCBCR_420_888_SINGLE_BUFFER_STRIDE_ALIGNED_64:
-    case F::YCBCR_P010_M_STRIDE_ALIGNED_64:
-      return RuleSet::kSemiPlanar420;
-    case F::YV12:
-      return RuleSet::kYv12;
-    case F::YCBCR_422_I:
-      return RuleSet::kInterleaved422;
-    case F::RAW16_BAYER_SBWC:
-      return RuleSet::kSbwcBayerLossless;
-    case F::RAW16_BAYER_SBWC_L50:
-    case F::RAW16_BAYER_SBWC_L75:
-      return RuleSet::kSbwcBayerLossy;
-    case F::YCBCR_420_SP_M_SBWC:
-    case F::YCBCR_420_SP_M_S10B_SBWC:
-    case F::YCRCB_420_SP_M_SBWC:
-    case F::YCBCR_420_SP_M_SBWC_STRIDE_ALIGNED_64:
-    case F::YCBCR_420_SP_M_S10B_SBWC_STRIDE_ALIGNED_64:
-      return RuleSet::kSbwcYuvLossless;
-    case F::YCBCR_420_SP_M_SBWC_L50:
-    case F::YCBCR_420_SP_M_SBWC_L75:
-    case F::YCBCR_420_SP_M_S10B_SBWC_L40:
-    case F::YCBCR_420_SP_M_S10B_SBWC_L60:
-    case F::YCBCR_420_SP_M_S10B_SBWC_L80:
-    case F::YCBCR_420_SP_M_SBWC_L50_STRIDE_ALIGNED_64:
-    case F::YCBCR_420_SP_M_S10B_SBWC_L40_STRIDE_ALIGNED_64:
-    case F::YCBCR_420_SP_M_S10B_SBWC_L80_STRIDE_ALIGNED_64:
-      return RuleSet::kSbwcYuvLossy;
-    case F::YCBCR_420_888_AFBC_EXTRAWIDEBLK:
-      return RuleSet::kAfbcExtraWideBlock;
-    case F::YCBCR_420_888_I_AFBC_WIDEBLK:
-      return RuleSet::kAfbcWideBlock;
-    default:
-      return RuleSet::kNone;
-  }
-}
-
-}  // namespace
-
 Status ImageFormat::ConformsTo(HalPixelFormat target, bool verbose) const {
   const std::string subject = verbose ? FormatToString(target) : std::string();
   const Conformance conformance(verbose, subject);
-  const int bpp = BitsPerPixel(target);
+  const FormatTraits* traits = FindFormatTraits(target);
+  const int bpp = traits != nullptr ? traits->bits_per_pixel : 8;
   for (const Component& c : components_) {
     if (c.bits_per_pixel != bpp) {
       StatusBuilder builder = InvalidArgumentErrorBuilder(ORVEX_LOC);
@@ -925,31 +711,32 @@ Status ImageFormat::ConformsTo(HalPixelFormat target, bool verbose) const {
   }
 
   using CC = ComponentContent;
-  switch (RuleSetOf(target)) {
-    case RuleSet::kNone: {
+  const Rules rules = traits != nullptr ? traits->rules : Rules::kNone;
+  switch (rules) {
+    case Rules::kNone: {
       StatusBuilder builder = UnimplementedErrorBuilder(ORVEX_LOC);
       if (verbose) builder << "Unable to check if conforms to " << subject;
       return builder;
     }
-    case RuleSet::kImplementationDefined:
+    case Rules::kImplementationDefined:
       return conformance.Fail(
           "There is no sensibe way to say if a format conforms to IMPLEMENTATION_DEFINED");
-    case RuleSet::kBlob:
+    case Rules::kBlob:
       if (FindComponent(components_, CC::kUnspecified) != nullptr) return OkStatus();
       return conformance.Fail("BLOB should have at least 1 unspecified component");
-    case RuleSet::kRaw:
+    case Rules::kRaw:
       ORVEX_CONFORMANCE_CALL(IsRaw(verbose));
       return OkStatus();
-    case RuleSet::kMonochrome: {
+    case Rules::kMonochrome: {
       ORVEX_CONFORMANCE_GET(luma, CC::kLuma);
       ORVEX_CONFORMANCE_CALL(CheckDimensionsValid(luma.width, luma.height, 2, 2, verbose));
-      const int multiple = target == F::Y8 ? 16 : target == F::Y16 ? 32 : 10;
+      const int multiple = traits->stride_multiple;
       if (luma.row_stride_bytes % multiple != 0) {
         return conformance.Fail("stride must be multiple of ", multiple);
       }
       return OkStatus();
     }
-    case RuleSet::kSemiPlanar420: {
+    case Rules::kSemiPlanar420: {
       ORVEX_CONFORMANCE_CALL(IsYuv(verbose));
       ORVEX_CONFORMANCE_CALL(ConformsTo(ChromaSubsampling::k420, verbose));
       ORVEX_CONFORMANCE_GET(luma, CC::kLuma);
@@ -962,8 +749,7 @@ Status ImageFormat::ConformsTo(HalPixelFormat target, bool verbose) const {
       if (cb.offset_bytes != cr.offset_bytes) {
         return conformance.Fail("chroma components should start at the same offset");
       }
-      if (IsOneOf(target, {F::YCBCR_P010, F::YCBCR_420_888_SINGLE_BUFFER,
-                           F::YCBCR_420_888_SINGLE_BUFFER_STRIDE_ALIGNED_64})) {
+      if (traits->single_buffer) {
         if (luma.buffer_index != cb.buffer_index) {
           return conformance.Fail("all components should be in the same buffer");
         }
@@ -981,17 +767,8 @@ Status ImageFormat::ConformsTo(HalPixelFormat target, bool verbose) const {
           cb.pixel_phase != cb_phase || cr.pixel_stride != 2 || cr.pixel_phase != cr_phase) {
         return conformance.Fail("pixel interleaving not as expected");
       }
-      size_t alignment = 0;
-      if (IsOneOf(target,
-                  {F::YCBCR_420_888_STRIDE_ALIGNED_64, F::YCBCR_420_SP_M_S10B_STRIDE_ALIGNED_64,
-                   F::YCBCR_420_888_SINGLE_BUFFER_STRIDE_ALIGNED_64,
-                   F::YCBCR_P010_M_STRIDE_ALIGNED_64})) {
-        alignment = 64;
-      } else if (target == F::YCBCR_P010_M) {
-        alignment = 32;
-      } else {
-        return OkStatus();
-      }
+      const auto alignment = static_cast<size_t>(traits->stride_multiple);
+      if (alignment == 0) return OkStatus();
       if (luma.row_stride_bytes != cb.row_stride_bytes ||
           luma.row_stride_bytes != cr.row_stride_bytes) {
         return conformance.Fail("components have different row strides, y: ", luma.row_stride_bytes,
@@ -1003,16 +780,17 @@ Status ImageFormat::ConformsTo(HalPixelFormat target, bool verbose) const {
       }
       return OkStatus();
     }
-    case RuleSet::kYv12: {
+    case Rules::kYv12: {
       ORVEX_CONFORMANCE_CALL(IsYuv(verbose));
       ORVEX_CONFORMANCE_CALL(ConformsTo(ChromaSubsampling::k420, verbose));
       ORVEX_CONFORMANCE_GET(luma, CC::kLuma);
       ORVEX_CONFORMANCE_GET(cb, CC::kChromaB);
       ORVEX_CONFORMANCE_GET(cr, CC::kChromaR);
       ORVEX_CONFORMANCE_CALL(CheckDimensionsValid(luma.width, luma.height, 4, 2, verbose));
-      if (luma.row_stride_bytes % 16 != 0 || cb.row_stride_bytes % 16 != 0 ||
-          cr.row_stride_bytes % 16 != 0) {
-        return conformance.Fail("component strides must all be multiples of 16");
+      const int multiple = traits->stride_multiple;
+      if (luma.row_stride_bytes % multiple != 0 || cb.row_stride_bytes % multiple != 0 ||
+          cr.row_stride_bytes % multiple != 0) {
+        return conformance.Fail("component strides must all be multiples of ", multiple);
       }
       if (luma.buffer_index != cb.buffer_index || luma.buffer_index != cr.buffer_index) {
         return conformance.Fail("All components should be in the same buffer");
@@ -1032,7 +810,7 @@ Status ImageFormat::ConformsTo(HalPixelFormat target, bool verbose) const {
       }
       return OkStatus();
     }
-    case RuleSet::kInterleaved422: {
+    case Rules::kInterleaved422: {
       ORVEX_CONFORMANCE_CALL(IsYuv(verbose));
       ORVEX_CONFORMANCE_CALL(ConformsTo(ChromaSubsampling::k422, verbose));
       ORVEX_CONFORMANCE_GET(luma, CC::kLuma);
@@ -1051,32 +829,27 @@ Status ImageFormat::ConformsTo(HalPixelFormat target, bool verbose) const {
       }
       return OkStatus();
     }
-    case RuleSet::kSbwcBayerLossless: {
+    case Rules::kSbwcBayerLossless: {
       ORVEX_CONFORMANCE_GET(header, CC::kCompressedBayerHeader);
       ORVEX_CONFORMANCE_GET(payload, CC::kCompressedBayerPayload);
       (void)header;
       (void)payload;
       return OkStatus();
     }
-    case RuleSet::kSbwcBayerLossy: {
+    case Rules::kSbwcBayerLossy: {
       ORVEX_CONFORMANCE_GET(payload, CC::kCompressedBayerPayload);
-      if (!IsAlignedTo(payload.row_stride_bytes, 32)) {
-        return conformance.Fail("row stride is not aligned to ", 32,
+      const auto alignment = static_cast<size_t>(traits->stride_multiple);
+      if (!IsAlignedTo(payload.row_stride_bytes, alignment)) {
+        return conformance.Fail("row stride is not aligned to ", alignment,
                                 " bytes: ", payload.row_stride_bytes, " for ",
                                 ComponentContentToString(payload.content));
       }
       return OkStatus();
     }
-    case RuleSet::kSbwcYuvLossless:
-    case RuleSet::kSbwcYuvLossy: {
-      const bool lossless = RuleSetOf(target) == RuleSet::kSbwcYuvLossless;
-      const bool stride_aligned_64 =
-          IsOneOf(target, {F::YCBCR_420_SP_M_SBWC_STRIDE_ALIGNED_64,
-                           F::YCBCR_420_SP_M_S10B_SBWC_STRIDE_ALIGNED_64,
-                           F::YCBCR_420_SP_M_SBWC_L50_STRIDE_ALIGNED_64,
-                           F::YCBCR_420_SP_M_S10B_SBWC_L40_STRIDE_ALIGNED_64,
-                           F::YCBCR_420_SP_M_S10B_SBWC_L80_STRIDE_ALIGNED_64});
-      const size_t alignment = stride_aligned_64 ? 64 : (lossless ? 16 : 32);
+    case Rules::kSbwcYuvLossless:
+    case Rules::kSbwcYuvLossy: {
+      const bool lossless = rules == Rules::kSbwcYuvLossless;
+      const auto alignment = static_cast<size_t>(traits->stride_multiple);
       static constexpr std::array<CC, 4> kLosslessContents = {
           CC::kCompressedLumaHeader, CC::kCompressedLumaPayload, CC::kCompressedChromaHeader,
           CC::kCompressedChromaPayload};
@@ -1094,10 +867,10 @@ Status ImageFormat::ConformsTo(HalPixelFormat target, bool verbose) const {
       }
       return OkStatus();
     }
-    case RuleSet::kAfbcExtraWideBlock:
-    case RuleSet::kAfbcWideBlock: {
+    case Rules::kAfbcExtraWideBlock:
+    case Rules::kAfbcWideBlock: {
       namespace afbc = afbc_size_utils::detail;
-      const bool extra_wide = target == F::YCBCR_420_888_AFBC_EXTRAWIDEBLK;
+      const bool extra_wide = rules == Rules::kAfbcExtraWideBlock;
       const int64_t w = width_;
       const int64_t luma_header = afbc::HeaderStride(afbc::HeaderWidth(target, w));
       const std::array<std::pair<CC, int64_t>, 4> expected = {{
