@@ -26,7 +26,7 @@ using orvex::ImageFormat;
 int RunFormats(const ParsedArgs& args, CommandContext& context) {
   if (args.Has("json")) {
     Json formats = Json::MakeArray();
-    for (HalPixelFormat format : AllHalPixelFormats()) {
+    for (HalPixelFormat format : orvex::AllHalPixelFormats()) {
       formats.Append(
           Json::MakeObject()
               .Set("name", orvex::FormatToString(format))
@@ -50,7 +50,7 @@ int RunFormats(const ParsedArgs& args, CommandContext& context) {
                    {"COMPRESSION"},
                    {"64B"},
                    {"UNCOMPRESSED"}});
-  for (HalPixelFormat format : AllHalPixelFormats()) {
+  for (HalPixelFormat format : orvex::AllHalPixelFormats()) {
     const HalPixelFormat uncompressed = orvex::CompressedFormatToNonCompressedFormat(format);
     table.AddRow(
         {HexCode(format), fmt::format("{}", static_cast<uint32_t>(format)),
@@ -150,7 +150,7 @@ int RunLayout(const ParsedArgs& args, CommandContext& context) {
   // be checked (UNIMPLEMENTED, a code that names no format) is an error.
   orvex::Status conformance = orvex::OkStatus();
   if (target.has_value()) {
-    const auto known = AllHalPixelFormats();
+    const auto known = orvex::AllHalPixelFormats();
     conformance = std::find(known.begin(), known.end(), *target) == known.end()
                       ? orvex::UnimplementedError(fmt::format("Unable to check if conforms to {}",
                                                               orvex::FormatToString(*target)))

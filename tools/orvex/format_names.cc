@@ -1,6 +1,5 @@
 #include "tools/orvex/format_names.h"
 
-#include <array>
 #include <cctype>
 #include <limits>
 #include <string>
@@ -15,50 +14,6 @@ namespace {
 
 using orvex::HalPixelFormat;
 
-constexpr std::array kFormats = {
-    HalPixelFormat::RGB_888,
-    HalPixelFormat::YCBCR_422_I,
-    HalPixelFormat::RAW16,
-    HalPixelFormat::BLOB,
-    HalPixelFormat::IMPLEMENTATION_DEFINED,
-    HalPixelFormat::YCBCR_420_888,
-    HalPixelFormat::RAW10,
-    HalPixelFormat::RAW12,
-    HalPixelFormat::YCBCR_P010,
-    HalPixelFormat::YCBCR_420_SP_M,
-    HalPixelFormat::YCBCR_420_SP_M_S10B,
-    HalPixelFormat::YCBCR_P010_M,
-    HalPixelFormat::YCBCR_420_SP_M_SBWC,
-    HalPixelFormat::YCBCR_420_SP_M_S10B_SBWC,
-    HalPixelFormat::YCRCB_420_SP_M_SBWC,
-    HalPixelFormat::YCBCR_420_SP_M_SBWC_L50,
-    HalPixelFormat::YCBCR_420_SP_M_SBWC_L75,
-    HalPixelFormat::YCBCR_420_SP_M_S10B_SBWC_L40,
-    HalPixelFormat::YCBCR_420_SP_M_S10B_SBWC_L60,
-    HalPixelFormat::YCBCR_420_SP_M_S10B_SBWC_L80,
-    HalPixelFormat::YCBCR_420_888_I_AFBC_WIDEBLK,
-    HalPixelFormat::YCBCR_420_888_AFBC_EXTRAWIDEBLK,
-    HalPixelFormat::Y8,
-    HalPixelFormat::Y16,
-    HalPixelFormat::YV12,
-    HalPixelFormat::RAW16_BAYER_SBWC,
-    HalPixelFormat::RAW16_BAYER_SBWC_L50,
-    HalPixelFormat::RAW16_BAYER_SBWC_L75,
-    HalPixelFormat::IMPLEMENTATION_DEFINED_64,
-    HalPixelFormat::YCBCR_420_888_SINGLE_BUFFER,
-    HalPixelFormat::Y10,
-    HalPixelFormat::YCBCR_420_888_STRIDE_ALIGNED_64,
-    HalPixelFormat::YCBCR_420_SP_M_STRIDE_ALIGNED_64,
-    HalPixelFormat::YCBCR_420_SP_M_SBWC_STRIDE_ALIGNED_64,
-    HalPixelFormat::YCBCR_420_SP_M_SBWC_L50_STRIDE_ALIGNED_64,
-    HalPixelFormat::YCBCR_420_SP_M_S10B_STRIDE_ALIGNED_64,
-    HalPixelFormat::YCBCR_420_SP_M_S10B_SBWC_STRIDE_ALIGNED_64,
-    HalPixelFormat::YCBCR_420_SP_M_S10B_SBWC_L40_STRIDE_ALIGNED_64,
-    HalPixelFormat::YCBCR_420_SP_M_S10B_SBWC_L80_STRIDE_ALIGNED_64,
-    HalPixelFormat::YCBCR_420_888_SINGLE_BUFFER_STRIDE_ALIGNED_64,
-    HalPixelFormat::YCBCR_P010_M_STRIDE_ALIGNED_64,
-};
-
 bool EqualsIgnoreCase(std::string_view a, std::string_view b) {
   if (a.size() != b.size()) return false;
   for (size_t i = 0; i < a.size(); ++i) {
@@ -72,10 +27,8 @@ bool EqualsIgnoreCase(std::string_view a, std::string_view b) {
 
 }  // namespace
 
-std::span<const HalPixelFormat> AllHalPixelFormats() { return kFormats; }
-
 orvex::StatusOr<HalPixelFormat> ParseHalPixelFormat(std::string_view text, std::string_view what) {
-  for (HalPixelFormat format : kFormats) {
+  for (HalPixelFormat format : orvex::AllHalPixelFormats()) {
     if (EqualsIgnoreCase(text, orvex::FormatToString(format))) return format;
   }
   if (text.empty() || !std::isdigit(static_cast<unsigned char>(text[0]))) {

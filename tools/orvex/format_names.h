@@ -15,9 +15,6 @@
 
 namespace orvex_tool {
 
-// Every enumerator of HalPixelFormat, in ascending code order.
-std::span<const orvex::HalPixelFormat> AllHalPixelFormats();
-
 // A format name (any letter case) or a decimal or 0x-hexadecimal code. Codes
 // need not name a known format: the library decides what it can lay out.
 orvex::StatusOr<orvex::HalPixelFormat> ParseHalPixelFormat(std::string_view text,

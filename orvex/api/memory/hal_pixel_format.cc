@@ -124,6 +124,15 @@ const FormatTraits* FindFormatTraits(HalPixelFormat format) {
 
 using hal_pixel_format_internal::FindFormatTraits;
 
+std::span<const HalPixelFormat> AllHalPixelFormats() {
+  static constexpr HalPixelFormat kAll[] = {
+#define ORVEX_FORMAT_ENUMERATOR(name, ...) HalPixelFormat::name,
+      ORVEX_HAL_PIXEL_FORMATS(ORVEX_FORMAT_ENUMERATOR)
+#undef ORVEX_FORMAT_ENUMERATOR
+  };
+  return kAll;
+}
+
 std::string FormatToString(HalPixelFormat format) {
   if (const auto* info = FindFormatTraits(format)) return std::string(info->name);
   return fmt::format("UnknownFormat_0x{:x}", static_cast<uint32_t>(format));

@@ -16,6 +16,7 @@
 // no compression, and the value itself as its uncompressed counterpart.
 
 #include <cstdint>
+#include <span>
 #include <string>
 
 #include "orvex/api/memory/buffer_attributes.h"
@@ -82,6 +83,10 @@ inline constexpr uint32_t kAfbcExtraWideBlockBit = 1u << 20;  // 64x4 unless wid
 constexpr bool IsAfbcFormat(HalPixelFormat format) {
   return (static_cast<uint32_t>(format) & kAfbcFormatBit) != 0 && format != HalPixelFormat::YV12;
 }
+
+// Every named format, in ascending order of code: the one list of formats
+// for tools and tests that go through them all.
+ORVEX_EXPORT std::span<const HalPixelFormat> AllHalPixelFormats();
 
 // The enumerator's name, or "UnknownFormat_0x<lower-case hex>" of the value
 // read as unsigned 32-bit.

@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <utility>
+#include <vector>
 
 #include "gtest/gtest.h"
 
@@ -81,6 +82,12 @@ TEST(HalPixelFormatTest, EveryCodeHasItsTableProperties) {
               row.uncompressed == 0 ? row.code : row.uncompressed);
     EXPECT_EQ(IsAfbcFormat(f), row.compression == BC::kAfbc);
   }
+  // The list of every format is this table, in the same (ascending) order.
+  std::vector<uint32_t> listed;
+  for (HalPixelFormat f : AllHalPixelFormats()) listed.push_back(static_cast<uint32_t>(f));
+  std::vector<uint32_t> codes;
+  for (const Row& row : kRows) codes.push_back(row.code);
+  EXPECT_EQ(listed, codes);
 }
 
 TEST(HalPixelFormatTest, ValuesThatAreNoEnumeratorFallBack) {
