@@ -202,18 +202,14 @@ TEST(BufferAllocateTest, ReturnsTheFirstBufferOrRefuses) {
   EXPECT_EQ(allocator.last_spec, "{type: AllocationSpec, size: 16, flags: 5} 3");
 
   const std::string spec = " for {type: AllocationSpec, size: 16, flags: 0}";
-  const struct {
-    StatusOr<Allocation> result;
-    Status expected;
-  } cases[] = {
+  const std::pair<StatusOr<Allocation>, Status> cases[] = {
       {ResourceExhaustedError("pool empty"), ResourceExhaustedError("pool empty")},
       {Allocation(), InternalError("Allocator returned no buffers" + spec)},
       {Allocation({nullptr, first}), InternalError("Allocator returned a null buffer" + spec)},
   };
-  for (const auto& c : cases) {
-    allocator.result = c.result;
-    EXPECT_THAT(Buffer::Allocate(&allocator, size, 0, FenceType::kDummy),
-                StatusIs(c.expected.code(), std::string(c.expected.message())));
+  for (const auto& [result, expected] : cases) {
+    allocator.result = result;
+    EXPECT_EQ(Buffer::Allocate(&allocator, size, 0, FenceType::kDummy).status(), expected);
   }
 }
 
@@ -221,10 +217,7 @@ TEST(AllocationDeathTest, BrokenPreconditions) {
   FakeAllocator allocator, child(&allocator);
   child.on_flush = [&] { allocator.Flush(); };
   uint64_t zero = 0, size = 8;
-  const struct {
-    std::function<void()> call;
-    const char* text;
-  } cases[] = {
+  const std::pair<std::function<void()>, const char*> cases[] = {
       {[] { AllocationSpec(0, 0, FenceType::kSoftware); },
        "Check failed: size > 0 AllocationSpec of 0 bytes"},
       {[&] { (void)Buffer::Allocate(&allocator, zero, 0, FenceType::kSoftware); },
@@ -239,9 +232,9 @@ TEST(AllocationDeathTest, BrokenPreconditions) {
        "Check failed: !FlushScope::IsFlushing\\(this\\) Allocator::Flush re-entered on the thread "
        "that is running it"},
   };
-  for (const auto& c : cases) {
-    SCOPED_TRACE(c.text);
-    EXPECT_DEATH(c.call(), c.text);
+  for (const auto& [call, text] : cases) {
+    SCOPED_TRACE(text);
+    EXPECT_DEATH(call(), text);
   }
 }
 

@@ -73,12 +73,10 @@ TEST(TwoStageSoftwareFenceTest, EveryTransition) {
        "never received",
        "-", "-"},
       {initial, kDoneE2, ok, e2, e2},
-      {initial, kAbort, ok, aborted, aborted},
       {ready, kReadyOk, "FAILED_PRECONDITION: " + std::string(kReadyAgainOk), ok, "-"},
       {ready, kReadyE2, ok, e2, e2},
       {ready, kDoneOk, ok, ok, ok},
       {ready, kDoneE2, ok, ok, e2},
-      {ready, kAbort, ok, aborted, aborted},
       {done_ok, kReadyOk, "FAILED_PRECONDITION: " + std::string(kReadyAgainOk), ok, ok},
       {done_ok, kReadyE2, ok, e2, ok},
       {done_ok, kDoneOk, done_twice + "OK New status = OK", ok, ok},
@@ -96,7 +94,6 @@ TEST(TwoStageSoftwareFenceTest, EveryTransition) {
       {done_after_ok_start, kReadyE2, ok, e2, e1},
       {done_after_ok_start, kDoneOk, done_twice + e1 + " New status = OK", ok, e1},
       {done_after_ok_start, kDoneE2, ok, ok, e2},
-      {done_after_ok_start, kAbort, ok, aborted, aborted},
   };
   for (size_t i = 0; i < std::size(cases); ++i) {
     const Case& c = cases[i];
@@ -124,7 +121,7 @@ TEST(TwoStageSoftwareFenceTest, ListenersRunOnlyInSignalDone) {
                                  "b " + kE2.ToString(), "d " + kE2.ToString()));
 }
 
-TEST(TwoStageSoftwareFenceTest, WaitsTimeOutAndWake) {
+TEST(TwoStageSoftwareFenceTest, WaitsTimeOutWakeAndForfeit) {
   TwoStageSoftwareFence fence;
   EXPECT_THAT(fence.GetReadyToStartStatus(),
               StatusIs(StatusCode::kUnavailable,
@@ -145,29 +142,25 @@ TEST(TwoStageSoftwareFenceTest, WaitsTimeOutAndWake) {
   EXPECT_TRUE(fence.WaitUntilReadyToStart(absl::InfiniteDuration()).ok());
   EXPECT_EQ(std::get<Status>(fence.WaitForDone(absl::Seconds(30))), kE1);
   producer.join();
-}
+  // Ready in time: no forfeit.
+  EXPECT_TRUE(fence.WaitUntilReadyToStartOrForfeit(absl::ZeroDuration(), kE2).ok());
+  EXPECT_EQ(std::get<Status>(fence.WaitForDone(absl::ZeroDuration())), kE1);
 
-TEST(TwoStageSoftwareFenceTest, ForfeitCarriesTheConsumerError) {
-  TwoStageSoftwareFence fence;
+  // A consumer that forfeits after its timeout; a second one finds that.
+  TwoStageSoftwareFence late;
   const Status forfeit = DeadlineExceededError("consumer gave up");
-  EXPECT_THAT(fence.WaitUntilReadyToStartOrForfeit(absl::Milliseconds(1), forfeit),
+  EXPECT_THAT(late.WaitUntilReadyToStartOrForfeit(absl::Milliseconds(1), forfeit),
               StatusIs(StatusCode::kDeadlineExceeded,
                        HasSubstr("ready-to-start signal with a timeout duration of: 1ms")));
-  EXPECT_EQ(std::get<Status>(fence.WaitForDone(absl::ZeroDuration())), forfeit);
-  EXPECT_EQ(fence.GetReadyToStartStatus(), forfeit);
-  EXPECT_THAT(fence.SignalDone(OkStatus()),
+  EXPECT_EQ(std::get<Status>(late.WaitForDone(absl::ZeroDuration())), forfeit);
+  EXPECT_EQ(late.GetReadyToStartStatus(), forfeit);
+  EXPECT_THAT(late.SignalDone(OkStatus()),
               StatusIs(StatusCode::kFailedPrecondition, HasSubstr("signaled done twice")));
-  // A second consumer finds the first one's timeout.
   EXPECT_THAT(
-      fence.WaitUntilReadyToStartOrForfeit(absl::Milliseconds(1), kE2),
+      late.WaitUntilReadyToStartOrForfeit(absl::Milliseconds(1), kE2),
       StatusIs(StatusCode::kInternal,
                "Ready-to-start fence is with timeout status (DEADLINE_EXCEEDED: consumer "
                "gave up), meaning that the consumer already timeout and gave up the frame"));
-
-  TwoStageSoftwareFence ready;
-  ASSERT_TRUE(ready.SignalReadyToStart(OkStatus()).ok());
-  EXPECT_TRUE(ready.WaitUntilReadyToStartOrForfeit(absl::ZeroDuration(), kE1).ok());
-  EXPECT_TRUE(NotDone(ready.WaitForDone(absl::ZeroDuration())));
 }
 
 TEST(TwoStageSoftwareFenceDeathTest, ContractViolations) {

@@ -75,16 +75,10 @@ TEST(HalfConversionTest, KnownValuesAndRounding) {
   const struct {
     uint16_t half;
     float value;
-  } cases[] = {{0x0000, 0.0f},
-               {0x8000, -0.0f},
-               {0x3C00, 1.0f},
-               {0xC000, -2.0f},
-               {0x3555, 0.333251953125f},
-               {0x7BFF, 65504.0f},
-               {0x0001, 0x1p-24f},
-               {0x03FF, 1023 * 0x1p-24f},
-               {0x0400, 0x1p-14f},
-               {0x7C00, std::numeric_limits<float>::infinity()}};
+  } cases[] = {{0x8000, -0.0f},           {0xC000, -2.0f},
+               {0x3555, 0.333251953125f}, {0x7BFF, 65504.0f},
+               {0x0001, 0x1p-24f},        {0x03FF, 1023 * 0x1p-24f},
+               {0x0400, 0x1p-14f},        {0x7C00, std::numeric_limits<float>::infinity()}};
   for (const auto& c : cases) {
     SCOPED_TRACE(c.half);
     EXPECT_EQ(HalfToFloat(c.half), c.value);
@@ -207,53 +201,39 @@ TEST(LocalToneMappingTest, FallingCurvesAreRaised) {
 }
 
 TEST(LocalToneMappingTest, InvalidInputsWriteNothing) {
-  const struct {
-    const char* name;
-    std::function<void(LocalToneMappingDataV1&)> spoil;
-    int n;
-    const char* message;
-  } cases[] = {
-      {"element size", [](auto& d) { d.grid->desc.element_size = 4; }, 8,
-       "Unexpected grid data size"},
-      {"entry size", [](auto& d) { d.guide_curve->desc.entry_size = 2; }, 8,
-       "Unexpected guide curve data size"},
-      {"no grid storage", [](auto& d) { d.grid = std::make_shared<CallerGrid>(0); }, 8,
-       "Empty grid buffer"},
-      {"no curve storage", [](auto& d) { d.guide_curve = std::make_shared<CallerCurve>(0); }, 8,
+  using Data = LocalToneMappingDataV1;
+  const std::string outside = "Grid strides address elements outside the grid buffer";
+  const std::pair<std::function<void(Data&)>, std::string> cases[] = {
+      {[](Data& d) { d.grid->desc.element_size = 4; }, "Unexpected grid data size"},
+      {[](Data& d) { d.guide_curve->desc.entry_size = 2; }, "Unexpected guide curve data size"},
+      {[](Data& d) { d.grid = std::make_shared<CallerGrid>(0); }, "Empty grid buffer"},
+      {[](Data& d) { d.guide_curve = std::make_shared<CallerCurve>(0); },
        "Empty guide_curve buffer"},
-      {"no grid", [](auto& d) { d.grid.reset(); }, 8, "Empty grid buffer"},
-      {"no curve", [](auto& d) { d.guide_curve.reset(); }, 8, "Empty guide_curve buffer"},
-      {"channels", [](auto& d) { d.grid->desc.channels = 3; }, 8,
+      {[](Data& d) { d.grid.reset(); }, "Empty grid buffer"},
+      {[](Data& d) { d.guide_curve.reset(); }, "Empty guide_curve buffer"},
+      {[](Data& d) { d.grid->desc.channels = 3; },
        "Unexpected grid dimension - expected 2 for (slope, bias), got 3"},
-      {"zero entries", [](auto&) {}, 0, "Gain table size must be at least 1, got 0"},
-      {"zero width", [](auto& d) { d.grid->desc.width = 0; }, 8,
-       "Empty grid: width 0, height 12, depth 8"},
-      {"zero height", [](auto& d) { d.grid->desc.height = 0; }, 8,
-       "Empty grid: width 16, height 0, depth 8"},
-      {"negative depth", [](auto& d) { d.grid->desc.depth = -1; }, 8,
-       "Empty grid: width 16, height 12, depth -1"},
-      {"empty curve", [](auto& d) { d.guide_curve->desc.num_entries = 0; }, 8,
-       "Empty guide curve: 0 entries"},
-      {"heap curve outrun", [](auto& d) { d.guide_curve->desc.num_entries = 129; }, 8,
+      {nullptr, "Gain table size must be at least 1, got 0"},
+      {[](Data& d) { d.grid->desc.width = 0; }, "Empty grid: width 0, height 12, depth 8"},
+      {[](Data& d) { d.grid->desc.height = 0; }, "Empty grid: width 16, height 0, depth 8"},
+      {[](Data& d) { d.grid->desc.depth = -1; }, "Empty grid: width 16, height 12, depth -1"},
+      {[](Data& d) { d.guide_curve->desc.num_entries = 0; }, "Empty guide curve: 0 entries"},
+      {[](Data& d) { d.guide_curve->desc.num_entries = 129; },  // outruns the heap storage
        "Guide curve entries outside the guide curve buffer"},
-      {"stride past heap storage", [](auto& d) { d.grid->desc.stride_z = 385; }, 8,
-       "Grid strides address elements outside the grid buffer"},
-      {"heap grid outrun", [](auto& d) { d.grid->desc.width = 17; }, 8,
-       "Grid strides address elements outside the grid buffer"},
-      {"negative stride", [](auto& d) { d.grid->desc.stride_x = -2; }, 8,
-       "Grid strides address elements outside the grid buffer"},
-      {"negative channel stride", [](auto& d) { d.grid->desc.stride_channel = -1; }, 8,
-       "Grid strides address elements outside the grid buffer"},
+      {[](Data& d) { d.grid->desc.stride_z = 385; }, outside},  // outruns the heap storage
+      {[](Data& d) { d.grid->desc.width = 17; }, outside},      // outruns the heap storage
+      {[](Data& d) { d.grid->desc.stride_x = -2; }, outside},
+      {[](Data& d) { d.grid->desc.stride_channel = -1; }, outside},
   };
-  for (const auto& c : cases) {
-    SCOPED_TRACE(c.name);
+  for (const auto& [spoil, message] : cases) {
+    SCOPED_TRACE(message);
     auto data = MakeData();
     data->SetIdentity();
-    c.spoil(*data);
+    if (spoil) spoil(*data);
     std::vector<float> lut(8, kSentinel);
-    EXPECT_THAT(data->GetGlobalToneMap(c.n, lut.data()),
-                StatusIs(StatusCode::kInvalidArgument, c.message));
-    EXPECT_THAT(lut, ::testing::Each(kSentinel));
+    EXPECT_THAT(data->GetGlobalToneMap(spoil ? 8 : 0, lut.data()),
+                StatusIs(StatusCode::kInvalidArgument, message));
+    EXPECT_THAT(lut, Each(kSentinel));
   }
 }
 
@@ -263,10 +243,7 @@ TEST(LocalToneMappingDeathTest, ContractViolations) {
   EXPECT_DEATH((void)data->GetGlobalToneMap(4, nullptr),
                "Check failed: gain_lut != nullptr \\(gain_lut=\\(null\\), nullptr=\\(null\\)\\) ");
   // SetIdentity writes through the descriptions, so they must be sound.
-  const struct {
-    std::function<void(LocalToneMappingDataV1&)> spoil;
-    const char* text;
-  } cases[] = {
+  const std::pair<std::function<void(LocalToneMappingDataV1&)>, const char*> cases[] = {
       {[](auto& d) { d.grid.reset(); }, "Check failed: grid != nullptr && guide_curve != nullptr "},
       {[](auto& d) { d.grid->desc.stride_y = 400; },
        "Check failed: GridLayoutFits\\(\\*grid\\) grid layout does not fit its storage"},
@@ -278,11 +255,11 @@ TEST(LocalToneMappingDeathTest, ContractViolations) {
       {[](auto& d) { d.guide_curve = std::make_shared<CallerCurve>(0); },
        "Check failed: base != nullptr && curve != nullptr "},
   };
-  for (const auto& c : cases) {
-    SCOPED_TRACE(c.text);
+  for (const auto& [spoil, text] : cases) {
+    SCOPED_TRACE(text);
     auto spoilt = MakeData();
-    c.spoil(*spoilt);
-    EXPECT_DEATH(spoilt->SetIdentity(), c.text);
+    spoil(*spoilt);
+    EXPECT_DEATH(spoilt->SetIdentity(), text);
   }
 }
 
