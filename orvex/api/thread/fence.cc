@@ -31,10 +31,10 @@ FenceWaitResult WaitForDoneUntil(const Fence& fence, absl::Duration deadline) {
   // WaitForDone: a done fence then costs no clock reading.
   const std::type_info& type = typeid(fence);
   if (type == typeid(SoftwareFence)) {
-    return static_cast<const SoftwareFence&>(fence).Wait(absl::ZeroDuration(), &deadline);
+    return static_cast<const SoftwareFence&>(fence).WaitUntil(deadline);
   }
   if (type == typeid(TwoStageSoftwareFence)) {
-    return static_cast<const TwoStageSoftwareFence&>(fence).Wait(absl::ZeroDuration(), &deadline);
+    return static_cast<const TwoStageSoftwareFence&>(fence).WaitUntil(deadline);
   }
   return fence.WaitForDone(TimeLeft(deadline));
 }
@@ -141,16 +141,23 @@ Status SoftwareFence::AddListener(FenceListener listener) {
 }
 
 FenceWaitResult SoftwareFence::WaitForDone(absl::Duration timeout) const {
-  return Wait(timeout, nullptr);
-}
-
-FenceWaitResult SoftwareFence::Wait(absl::Duration timeout, const absl::Duration* until) const {
   PerfTrace trace(5, "SoftwareFence WaitForDone");
   std::unique_lock<std::mutex> lock(mutex_);
   // A wait that begins after the signal returns at once, also one that a
   // listener of that signal makes on its own thread.
   if (signaled_) return status_;
-  if (until != nullptr) timeout = fence_internal::TimeLeft(*until);
+  return WaitLocked(lock, timeout);
+}
+
+FenceWaitResult SoftwareFence::WaitUntil(absl::Duration deadline) const {
+  PerfTrace trace(5, "SoftwareFence WaitForDone");
+  std::unique_lock<std::mutex> lock(mutex_);
+  if (signaled_) return status_;
+  return WaitLocked(lock, fence_internal::TimeLeft(deadline));
+}
+
+FenceWaitResult SoftwareFence::WaitLocked(std::unique_lock<std::mutex>& lock,
+                                          absl::Duration timeout) const {
   if (timeout <= absl::ZeroDuration()) return orvex_api::FenceNotDone{};
   // A waiter blocked before the signal wakes once every listener has run.
   const auto done = [this] { return signaled_ && listeners_running_ == 0; };

@@ -168,9 +168,13 @@ class ORVEX_EXPORT SoftwareFence : public Fence {
  private:
   friend FenceWaitResult fence_internal::WaitForDoneUntil(const Fence&, absl::Duration);
 
-  // WaitForDone(timeout); with `until` (see WaitForDoneUntil), the timeout
-  // is the time left until it, read only when the fence is not done.
-  FenceWaitResult Wait(absl::Duration timeout, const absl::Duration* until) const;
+  // WaitForDone with the time left until `deadline` (see WaitForDoneUntil),
+  // read only when the fence is not done. Hidden: bound within the library.
+  [[gnu::visibility("hidden")]] FenceWaitResult WaitUntil(absl::Duration deadline) const;
+  // The blocking part of a wait, entered with `lock` held on a fence not yet
+  // signalled.
+  [[gnu::visibility("hidden")]] FenceWaitResult WaitLocked(std::unique_lock<std::mutex>& lock,
+                                                           absl::Duration timeout) const;
 
   // mutex_ guards every field below.
   mutable std::mutex mutex_;

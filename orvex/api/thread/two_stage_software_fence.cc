@@ -21,17 +21,23 @@ TwoStageSoftwareFence::~TwoStageSoftwareFence() {
 }
 
 FenceWaitResult TwoStageSoftwareFence::WaitForDone(absl::Duration timeout) const {
-  return Wait(timeout, nullptr);
-}
-
-FenceWaitResult TwoStageSoftwareFence::Wait(absl::Duration timeout,
-                                            const absl::Duration* until) const {
   PerfTrace trace(5, "TwoStageSoftwareFence WaitForDone");
   std::unique_lock<std::mutex> lock(mutex_);
   // A wait that begins once the fence is done returns at once, also one that
   // a listener of SignalDone makes on its own thread.
   if (done_status_.has_value()) return *done_status_;
-  if (until != nullptr) timeout = fence_internal::TimeLeft(*until);
+  return WaitLocked(lock, timeout);
+}
+
+FenceWaitResult TwoStageSoftwareFence::WaitUntil(absl::Duration deadline) const {
+  PerfTrace trace(5, "TwoStageSoftwareFence WaitForDone");
+  std::unique_lock<std::mutex> lock(mutex_);
+  if (done_status_.has_value()) return *done_status_;
+  return WaitLocked(lock, fence_internal::TimeLeft(deadline));
+}
+
+FenceWaitResult TwoStageSoftwareFence::WaitLocked(std::unique_lock<std::mutex>& lock,
+                                                  absl::Duration timeout) const {
   if (timeout <= absl::ZeroDuration()) return orvex_api::FenceNotDone{};
   // A waiter blocked before SignalDone wakes once every listener has run.
   const auto done = [this] { return done_status_.has_value() && listeners_running_ == 0; };

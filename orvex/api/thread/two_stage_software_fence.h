@@ -77,9 +77,13 @@ class ORVEX_EXPORT TwoStageSoftwareFence : public Fence {
  private:
   friend FenceWaitResult fence_internal::WaitForDoneUntil(const Fence&, absl::Duration);
 
-  // WaitForDone(timeout); with `until` (see WaitForDoneUntil), the timeout
-  // is the time left until it, read only when the fence is not done.
-  FenceWaitResult Wait(absl::Duration timeout, const absl::Duration* until) const;
+  // WaitForDone with the time left until `deadline` (see WaitForDoneUntil),
+  // read only when the fence is not done. Hidden: bound within the library.
+  [[gnu::visibility("hidden")]] FenceWaitResult WaitUntil(absl::Duration deadline) const;
+  // The blocking part of a wait for done, entered with `lock` held on a
+  // fence not yet done.
+  [[gnu::visibility("hidden")]] FenceWaitResult WaitLocked(std::unique_lock<std::mutex>& lock,
+                                                           absl::Duration timeout) const;
   // Waits until ready_to_start_status_ is engaged; false on timeout.
   bool WaitForReadyLocked(std::unique_lock<std::mutex>& lock, absl::Duration timeout) const;
   static Status ReadyTimeoutError(absl::Duration timeout);
