@@ -22,7 +22,7 @@
 // Listeners should not throw. If one does inside Signal() or SignalDone(),
 // the fence completes as usual all the same: the other listeners still run,
 // waiters wake, and then the first exception is rethrown to the caller of
-// Signal()/SignalDone() (later ones are logged and dropped).
+// Signal()/SignalDone() (later ones are dropped).
 
 #include <atomic>
 #include <condition_variable>
@@ -152,9 +152,9 @@ class ORVEX_EXPORT SoftwareFence : public Fence {
   // Always returns OK; see the class comment for where `listener` runs.
   Status AddListener(FenceListener listener) override;
 
-  // The status at once once signalled; otherwise polls (timeout <= 0),
-  // waits without limit (infinite) or until the timeout, rounded up to
-  // whole microseconds, has passed.
+  // Once signalled, returns the status at once. Before that, polls
+  // (timeout <= 0), waits without limit (infinite) or until the timeout,
+  // rounded up to whole microseconds, has passed.
   FenceWaitResult WaitForDone(absl::Duration timeout) const override;
 
   // Returns the fence to the not-signalled state for reuse, renamed `name`.

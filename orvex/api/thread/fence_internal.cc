@@ -37,12 +37,7 @@ std::exception_ptr CallListeners(const std::vector<FenceListener>& listeners,
     try {
       CallListener(listener, status);
     } catch (...) {
-      if (first == nullptr) {
-        first = std::current_exception();
-      } else {
-        ORVEX_LOG(ERROR) << "Another listener of the same fence signal threw; only the first "
-                            "exception is rethrown, this one is dropped";
-      }
+      if (first == nullptr) first = std::current_exception();
     }
   }
   return first;

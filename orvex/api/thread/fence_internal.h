@@ -26,7 +26,7 @@ inline void CallListener(const FenceListener& listener, Status status) {
 // Calls each listener in order with its own copy of `status`. One that
 // throws does not keep the others from running: the first exception is
 // returned, for the caller to rethrow once its fence is consistent again;
-// later ones are logged and dropped.
+// later ones are dropped.
 std::exception_ptr CallListeners(const std::vector<FenceListener>& listeners, const Status& status);
 
 // The time left until `deadline` (a SteadyNow() value), clamped at zero;

@@ -164,8 +164,11 @@ TEST(FenceDeathTest, ContractViolations) {
                "before calling this function.");
   EXPECT_DEATH(
       {
+        // Deleted by the listener of a fence that its own listener signals.
         auto* doomed = new SoftwareFence("doomed");
-        (void)doomed->AddListener([doomed](Status) { delete doomed; });
+        SoftwareFence other;
+        (void)other.AddListener([doomed](Status) { delete doomed; });
+        (void)doomed->AddListener([&other](Status) { other.Signal(OkStatus()); });
         doomed->Signal(OkStatus());
       },
       "SoftwareFence \"doomed\" destroyed by one of its own listeners while being signalled");

@@ -75,32 +75,36 @@ TEST(MergedFenceTest, FirstErrorInFenceOrderWins) {
 TEST(MergedFenceTest, EachFenceGetsOneWaitWithItsShareOfTheTimeout) {
   const absl::Duration ms = absl::Milliseconds(1), inf = absl::InfiniteDuration();
   SoftwareFence done, pending;
+  TwoStageSoftwareFence two_stage_done, two_stage_pending;
   done.Signal(OkStatus());
-  // `first` sleeps `delay` and answers `result`; `second` comes after a done
-  // software fence (and `pending`, if used, after `first`).
+  ASSERT_TRUE(two_stage_done.SignalDone(kE1).ok());
+  // `first` sleeps `delay` and answers `result`; `second` comes after done
+  // fences of both kinds (and `pending`, if any, after `first`).
   const struct {
     absl::Duration timeout;
     FenceWaitResult result;
     absl::Duration delay;
-    bool use_pending, done;
+    Fence* pending;
+    bool done;
     absl::Duration first_min;  // up to `timeout`
     size_t second_calls;
     absl::Duration second_min, second_max;
   } cases[] = {
-      {-3 * ms, OkStatus(), ms, false, true, -3 * ms, 1, -3 * ms, -3 * ms},
-      {0 * ms, OkStatus(), ms, false, true, 0 * ms, 1, 0 * ms, 0 * ms},
-      {inf, OkStatus(), ms, false, true, inf, 1, inf, inf},
-      {20 * ms, OkStatus(), ms, false, true, 15 * ms, 1, absl::Nanoseconds(1), 19 * ms},
-      {20 * ms, OkStatus(), 30 * ms, false, true, 15 * ms, 1, 0 * ms, 0 * ms},  // past deadline
-      {20 * ms, orvex_api::FenceNotDone{}, ms, false, false, 15 * ms, 0, {}, {}},
-      {5 * ms, OkStatus(), ms, true, false, 4 * ms, 0, {}, {}},  // `pending` times out
+      {-3 * ms, OkStatus(), ms, nullptr, true, -3 * ms, 1, -3 * ms, -3 * ms},
+      {0 * ms, OkStatus(), ms, nullptr, true, 0 * ms, 1, 0 * ms, 0 * ms},
+      {inf, OkStatus(), ms, nullptr, true, inf, 1, inf, inf},
+      {20 * ms, OkStatus(), ms, nullptr, true, 15 * ms, 1, absl::Nanoseconds(1), 19 * ms},
+      {20 * ms, OkStatus(), 30 * ms, nullptr, true, 15 * ms, 1, 0 * ms, 0 * ms},  // past deadline
+      {20 * ms, orvex_api::FenceNotDone{}, ms, nullptr, false, 15 * ms, 0, {}, {}},
+      {5 * ms, OkStatus(), ms, &pending, false, 4 * ms, 0, {}, {}},  // `pending` times out
+      {5 * ms, OkStatus(), ms, &two_stage_pending, false, 4 * ms, 0, {}, {}},
   };
   for (const auto& c : cases) {
     SCOPED_TRACE(c.timeout);
     RecordingFence first(c.result, c.delay), second;
-    std::vector<Fence*> fences = {&first, &done, &second};
-    if (c.use_pending) fences.insert(fences.begin() + 1, &pending);
-    EXPECT_EQ(!NotDone(MergeFences(fences)->WaitForDone(c.timeout)), c.done);
+    std::vector<Fence*> fences = {&first, c.pending, &done, &two_stage_done, &second};
+    EXPECT_EQ(Done(MergeFences(fences)->WaitForDone(c.timeout)),
+              c.done ? kE1 : InternalError("not done"));
     ASSERT_EQ(first.timeouts.size(), 1u);
     EXPECT_GE(first.timeouts[0], c.first_min);
     EXPECT_LE(first.timeouts[0], c.timeout);
