@@ -10,6 +10,35 @@
 #include "orvex/status/status_macros.h"
 
 namespace orvex {
+namespace {
+
+// The allocators whose Flush() runs on this thread, innermost first: this
+// thread holds their registry mutexes.
+class FlushScope {
+ public:
+  explicit FlushScope(const Allocator* allocator) : allocator_(allocator), outer_(innermost_) {
+    innermost_ = this;
+  }
+  ~FlushScope() { innermost_ = outer_; }
+  FlushScope(const FlushScope&) = delete;
+  FlushScope& operator=(const FlushScope&) = delete;
+
+  static bool IsFlushing(const Allocator* allocator) {
+    for (const FlushScope* scope = innermost_; scope != nullptr; scope = scope->outer_) {
+      if (scope->allocator_ == allocator) return true;
+    }
+    return false;
+  }
+
+ private:
+  static thread_local FlushScope* innermost_;
+  const Allocator* allocator_;
+  FlushScope* outer_;
+};
+
+thread_local FlushScope* FlushScope::innermost_ = nullptr;
+
+}  // namespace
 
 AllocationSpec::AllocationSpec(uint64_t size, Flags flags, FenceType fence_type)
     : request_(BySize{size, flags}), fence_type_(fence_type) {
@@ -66,17 +95,34 @@ Allocator::~Allocator() = default;
 std::vector<std::shared_ptr<Allocator>> Allocator::GetParents() const { return parents_; }
 
 void Allocator::Flush() {
+  ORVEX_CHECK(!FlushScope::IsFlushing(this))
+      << "Allocator::Flush re-entered on the thread that is running it";
   std::lock_guard<std::mutex> lock(registry_mutex_);
-  for (Allocator* allocator : registry_) allocator->Flush();
+  const FlushScope scope(this);
+  // The flushed allocators may change the registry from this thread (an
+  // allocator destroyed meanwhile unregisters itself): iterate over a copy
+  // and skip those no longer registered.
+  const std::vector<Allocator*> registered(registry_.begin(), registry_.end());
+  for (Allocator* allocator : registered) {
+    if (registry_.contains(allocator)) allocator->Flush();
+  }
 }
 
 void Allocator::RegisterAllocator(Allocator* allocator) {
   if (allocator == nullptr) return;
+  if (FlushScope::IsFlushing(this)) {  // the mutex is held by this thread's Flush()
+    registry_.insert(allocator);
+    return;
+  }
   std::lock_guard<std::mutex> lock(registry_mutex_);
   registry_.insert(allocator);
 }
 
 void Allocator::UnregisterAllocator(Allocator* allocator) {
+  if (FlushScope::IsFlushing(this)) {  // the mutex is held by this thread's Flush()
+    registry_.erase(allocator);
+    return;
+  }
   std::lock_guard<std::mutex> lock(registry_mutex_);
   registry_.erase(allocator);
 }

@@ -19,9 +19,11 @@
 //
 // Thread safety: AllocationSpec and Allocation are values. Allocator's
 // registry is guarded by its mutex; Flush holds it while flushing the
-// registered allocators, so a registered allocator's Flush must not flush
-// back into an allocator whose Flush is running on the same thread. The
-// graph functions take no lock: parent links must not change meanwhile.
+// registered allocators. Those may register and unregister allocators (also
+// themselves, or by being destroyed) on the same thread, but must not flush
+// back into an allocator whose Flush is running on that thread (a contract
+// violation that ends the process). The graph functions take no lock: parent
+// links must not change meanwhile.
 
 #include <cstdint>
 #include <memory>
@@ -139,13 +141,15 @@ class ORVEX_EXPORT Allocator : public virtual Printable {
   virtual uint64_t GetAllocatedBytes() const = 0;
 
   // Flushes every allocator in the registry (in the set's order) with the
-  // registry mutex held.
+  // registry mutex held. An allocator unregistered meanwhile is not flushed
+  // any more; one registered meanwhile is not flushed by this call.
   virtual void Flush();
 
   // Adds `allocator` to (or removes it from) the registry that Flush acts
   // on. The registry does not own its entries: an allocator must be removed
   // before it is destroyed, in its most derived destructor. Adding one that
-  // is already there, or removing one that is not, does nothing.
+  // is already there, or removing one that is not, does nothing. Both may
+  // be called from inside this allocator's Flush() on its thread.
   void RegisterAllocator(Allocator* allocator);
   void UnregisterAllocator(Allocator* allocator);
 

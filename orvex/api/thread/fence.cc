@@ -2,10 +2,12 @@
 
 #include <chrono>
 #include <cstdint>
+#include <exception>
 #include <memory>
 #include <mutex>
 #include <optional>
 #include <string>
+#include <typeinfo>
 #include <utility>
 #include <variant>
 #include <vector>
@@ -18,6 +20,26 @@
 #include "orvex/status/status_builder.h"
 
 namespace orvex {
+namespace fence_internal {
+
+absl::Duration SteadyNow() {
+  return absl::FromChrono(std::chrono::steady_clock::now().time_since_epoch());
+}
+
+FenceWaitResult WaitForDoneUntil(const Fence& fence, absl::Duration deadline) {
+  // Exactly these kinds, not kinds derived from them that may override
+  // WaitForDone: a done fence then costs no clock reading.
+  const std::type_info& type = typeid(fence);
+  if (type == typeid(SoftwareFence)) {
+    return static_cast<const SoftwareFence&>(fence).WaitUntil(deadline);
+  }
+  if (type == typeid(TwoStageSoftwareFence)) {
+    return static_cast<const TwoStageSoftwareFence&>(fence).WaitUntil(deadline);
+  }
+  return fence.WaitForDone(TimeLeft(deadline));
+}
+
+}  // namespace fence_internal
 
 Fence::~Fence() = default;
 
@@ -85,13 +107,12 @@ void SoftwareFence::Signal(Status status) {
       ++listeners_running_;
     }
   }
+  std::exception_ptr thrown;
   if (!listeners.empty()) {
     {
       fence_internal::ListenerScope scope(this);
       // `status` was reassigned from status_ when listeners were taken.
-      for (FenceListener& listener : listeners) {
-        fence_internal::CallListener(listener, status);  // NOLINT(bugprone-use-after-move)
-      }
+      thrown = fence_internal::CallListeners(listeners, status);  // NOLINT(bugprone-use-after-move)
     }
     std::lock_guard<std::mutex> lock(mutex_);
     --listeners_running_;
@@ -100,6 +121,8 @@ void SoftwareFence::Signal(Status status) {
   // waiters makes no system call.
   cond_.notify_all();
   active.reset();
+  // The fence is complete; from here on it may already be destroyed.
+  if (thrown != nullptr) std::rethrow_exception(thrown);
   // The taken listeners are destroyed last, outside the fence.
 }
 
@@ -120,11 +143,23 @@ Status SoftwareFence::AddListener(FenceListener listener) {
 FenceWaitResult SoftwareFence::WaitForDone(absl::Duration timeout) const {
   PerfTrace trace(5, "SoftwareFence WaitForDone");
   std::unique_lock<std::mutex> lock(mutex_);
-  if (timeout <= absl::ZeroDuration()) {
-    if (signaled_) return status_;
-    return orvex_api::FenceNotDone{};
-  }
-  // A blocked waiter wakes only once every listener of the signal has run.
+  // A wait that begins after the signal returns at once, also one that a
+  // listener of that signal makes on its own thread.
+  if (signaled_) return status_;
+  return WaitLocked(lock, timeout);
+}
+
+FenceWaitResult SoftwareFence::WaitUntil(absl::Duration deadline) const {
+  PerfTrace trace(5, "SoftwareFence WaitForDone");
+  std::unique_lock<std::mutex> lock(mutex_);
+  if (signaled_) return status_;
+  return WaitLocked(lock, fence_internal::TimeLeft(deadline));
+}
+
+FenceWaitResult SoftwareFence::WaitLocked(std::unique_lock<std::mutex>& lock,
+                                          absl::Duration timeout) const {
+  if (timeout <= absl::ZeroDuration()) return orvex_api::FenceNotDone{};
+  // A waiter blocked before the signal wakes once every listener has run.
   const auto done = [this] { return signaled_ && listeners_running_ == 0; };
   const std::optional<std::chrono::steady_clock::time_point> deadline =
       fence_internal::DeadlineAfter(timeout, absl::Microseconds(1));

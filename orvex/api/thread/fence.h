@@ -18,6 +18,11 @@
 //
 // Thread safety: every operation of the fences here may be called from any
 // thread. Listeners never run while a fence's lock is held.
+//
+// Listeners should not throw. If one does inside Signal() or SignalDone(),
+// the fence completes as usual all the same: the other listeners still run,
+// waiters wake, and then the first exception is rethrown to the caller of
+// Signal()/SignalDone() (later ones are dropped).
 
 #include <atomic>
 #include <condition_variable>
@@ -49,6 +54,19 @@ using FenceWaitResult = std::variant<orvex_api::FenceNotDone, Status>;
 
 // A listener receives the final status exactly once.
 using FenceListener = std::function<void(Status)>;
+
+class Fence;
+
+namespace fence_internal {
+
+// For WaitForMultipleFencesDone (merged_fence.h): the steady clock's time
+// since its epoch, and one wait for `fence` with the time left until
+// `deadline` (a SteadyNow() value), clamped at zero. The fence kinds of this
+// file read the clock only when they find themselves not done.
+ORVEX_EXPORT absl::Duration SteadyNow();
+ORVEX_EXPORT FenceWaitResult WaitForDoneUntil(const Fence& fence, absl::Duration deadline);
+
+}  // namespace fence_internal
 
 // The kind of fence CreateFence makes.
 enum class FenceType : int32_t {
@@ -105,7 +123,9 @@ class ORVEX_EXPORT DummyFence final : public Fence {
 // A fence completed by Signal(). Before the first signal it is not done;
 // after it, every wait returns the last signalled status. Listeners added
 // before the signal run on the signalling thread, in the order added, before
-// waiters wake; listeners added afterwards run at once on the adder's thread.
+// waiters blocked in WaitForDone() wake; listeners added afterwards run at
+// once on the adder's thread. A wait that begins after the signal (also one
+// made by a listener of that signal) returns at once.
 class ORVEX_EXPORT SoftwareFence : public Fence {
  public:
   // Named "unnamed".
@@ -122,6 +142,8 @@ class ORVEX_EXPORT SoftwareFence : public Fence {
 
   // Completes the fence with `status` (a later call replaces the status and
   // calls no listener), calls the pending listeners, then wakes waiters.
+  // Destroying the called listeners is the last thing it does, so they may
+  // own the fence.
   void Signal(Status status);
 
   // Signal(AbortedError("Fence was aborted")).
@@ -130,8 +152,9 @@ class ORVEX_EXPORT SoftwareFence : public Fence {
   // Always returns OK; see the class comment for where `listener` runs.
   Status AddListener(FenceListener listener) override;
 
-  // Polls (timeout <= 0), waits without limit (infinite) or until the
-  // timeout, rounded up to whole microseconds, has passed.
+  // Once signalled, returns the status at once. Before that, polls
+  // (timeout <= 0), waits without limit (infinite) or until the timeout,
+  // rounded up to whole microseconds, has passed.
   FenceWaitResult WaitForDone(absl::Duration timeout) const override;
 
   // Returns the fence to the not-signalled state for reuse, renamed `name`.
@@ -143,6 +166,16 @@ class ORVEX_EXPORT SoftwareFence : public Fence {
   std::string name() const;
 
  private:
+  friend FenceWaitResult fence_internal::WaitForDoneUntil(const Fence&, absl::Duration);
+
+  // WaitForDone with the time left until `deadline` (see WaitForDoneUntil),
+  // read only when the fence is not done. Hidden: bound within the library.
+  [[gnu::visibility("hidden")]] FenceWaitResult WaitUntil(absl::Duration deadline) const;
+  // The blocking part of a wait, entered with `lock` held on a fence not yet
+  // signalled.
+  [[gnu::visibility("hidden")]] FenceWaitResult WaitLocked(std::unique_lock<std::mutex>& lock,
+                                                           absl::Duration timeout) const;
+
   // mutex_ guards every field below.
   mutable std::mutex mutex_;
   mutable std::condition_variable cond_;

@@ -1,9 +1,12 @@
 #include "orvex/api/thread/fence_internal.h"
 
+#include <algorithm>
 #include <atomic>
 #include <chrono>
+#include <exception>
 #include <optional>
 #include <thread>
+#include <vector>
 
 #include "absl/time/time.h"
 #include "orvex/status/log.h"
@@ -25,6 +28,23 @@ std::optional<std::chrono::steady_clock::time_point> DeadlineAfter(absl::Duratio
   if (timeout >= kLongestFiniteWait) return std::nullopt;
   const absl::Duration rounded = absl::Ceil(timeout, unit);
   return std::chrono::steady_clock::now() + absl::ToChronoNanoseconds(rounded);
+}
+
+std::exception_ptr CallListeners(const std::vector<FenceListener>& listeners,
+                                 const Status& status) {
+  std::exception_ptr first;
+  for (const FenceListener& listener : listeners) {
+    try {
+      CallListener(listener, status);
+    } catch (...) {
+      if (first == nullptr) first = std::current_exception();
+    }
+  }
+  return first;
+}
+
+absl::Duration TimeLeft(absl::Duration deadline) {
+  return std::max(absl::ZeroDuration(), deadline - SteadyNow());
 }
 
 ListenerScope::ListenerScope(const void* fence) : fence_(fence), outer_(innermost_scope) {

@@ -5,9 +5,11 @@
 
 #include <atomic>
 #include <chrono>
+#include <exception>
 #include <optional>
 #include <string_view>
 #include <utility>
+#include <vector>
 
 #include "absl/time/time.h"
 #include "orvex/api/thread/fence.h"
@@ -20,6 +22,16 @@ namespace fence_internal {
 inline void CallListener(const FenceListener& listener, Status status) {
   if (listener) listener(std::move(status));
 }
+
+// Calls each listener in order with its own copy of `status`. One that
+// throws does not keep the others from running: the first exception is
+// returned, for the caller to rethrow once its fence is consistent again;
+// later ones are dropped.
+std::exception_ptr CallListeners(const std::vector<FenceListener>& listeners, const Status& status);
+
+// The time left until `deadline` (a SteadyNow() value), clamped at zero;
+// infinite for an infinite deadline.
+absl::Duration TimeLeft(absl::Duration deadline);
 
 // The steady-clock deadline `timeout` from now, with the timeout rounded up
 // to a whole multiple of `unit`. Empty for an infinite timeout and for a

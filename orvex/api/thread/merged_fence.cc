@@ -1,6 +1,7 @@
 #include "orvex/api/thread/merged_fence.h"
 
 #include <atomic>
+#include <exception>
 #include <memory>
 #include <mutex>
 #include <utility>
@@ -34,14 +35,22 @@ void MergedFence::Register() {
   for (Fence* fence : fences_) {
     // A missing fence counts as done with OK, as in the waits.
     if (fence == nullptr) {
-      if (remaining_.fetch_sub(1, std::memory_order_acq_rel) == 1) CallListeners();
+      if (remaining_.fetch_sub(1, std::memory_order_acq_rel) == 1) {
+        std::vector<FenceListener> called;
+        CallListeners(called);
+      }
       continue;
     }
-    Status status = fence->AddListener([self](const Status& /*status*/) {
-      // The last covered fence to finish hands out the listeners; acquire
-      // makes the other fences' completion visible to it.
-      if (self->remaining_.fetch_sub(1, std::memory_order_acq_rel) == 1) self->CallListeners();
-    });
+    // The last covered fence to finish hands out the listeners; acquire
+    // makes the other fences' completion visible to it. The listeners it
+    // called live on in this callback, so that the covered fence destroys
+    // them with its own listeners, after its signal.
+    Status status = fence->AddListener(
+        [self, called = std::vector<FenceListener>()](const Status& /*status*/) mutable {
+          if (self->remaining_.fetch_sub(1, std::memory_order_acq_rel) == 1) {
+            self->CallListeners(called);
+          }
+        });
     if (!status.ok()) registration_status_ = std::move(status);
   }
 }
@@ -63,16 +72,15 @@ Status MergedFence::AddListener(FenceListener listener) {
   return OkStatus();
 }
 
-void MergedFence::CallListeners() {
-  std::vector<FenceListener> listeners;
+void MergedFence::CallListeners(std::vector<FenceListener>& called) {
   {
     std::lock_guard<std::mutex> lock(mutex_);
-    listeners.swap(listeners_);
+    called.swap(listeners_);
     listeners_called_ = true;
   }
-  if (listeners.empty()) return;
-  const Status status = GetFenceStatus();
-  for (const FenceListener& listener : listeners) fence_internal::CallListener(listener, status);
+  if (called.empty()) return;
+  std::exception_ptr thrown = fence_internal::CallListeners(called, GetFenceStatus());
+  if (thrown != nullptr) std::rethrow_exception(thrown);
 }
 
 void MergedFence::Abort() {

@@ -16,11 +16,14 @@
 //
 // Thread safety: every operation may be called from any thread. Listeners
 // run once, outside any lock: on the thread whose covered fence completed
-// last, or on the adder's thread when the merged fence is already done.
+// last, or on the adder's thread when the merged fence is already done. In
+// the first case they are destroyed where that covered fence destroys its
+// own listeners (for the fences here: once its signal is complete), so a
+// listener may be the last owner of the fences it waits for. A listener
+// that throws: the others still run, then the first exception propagates
+// out of the covered fence's signal (see fence.h).
 
-#include <algorithm>
 #include <atomic>
-#include <chrono>
 #include <cstdint>
 #include <memory>
 #include <mutex>
@@ -35,34 +38,23 @@
 
 namespace orvex {
 
-// Waits for `fences` in order against one deadline (timeout from now; an
-// infinite timeout waits without limit, a zero or negative one polls each
-// fence). FenceNotDone as soon as one fence is not done in time; otherwise
-// the first non-OK status, or OK. A null entry counts as done with OK.
-// T is any pointer-like type to a Fence (Fence*, std::shared_ptr<Fence>...).
+// Waits for `fences` in order, calling each one's WaitForDone once. A zero
+// or negative timeout polls: each fence gets that same timeout. Any other
+// timeout fixes one deadline from now, and each fence gets the time left
+// until it, clamped at zero (fences reached after the deadline are polled);
+// an infinite timeout waits for each without limit. FenceNotDone as soon as
+// one fence is not done in time; otherwise the first non-OK status, or OK.
+// A null entry counts as done with OK. T is any pointer-like type to a Fence
+// (Fence*, std::shared_ptr<Fence>...).
 template <typename T>
 FenceWaitResult WaitForMultipleFencesDone(const std::vector<T>& fences, absl::Duration timeout) {
-  using Clock = std::chrono::steady_clock;
-  // Longer timeouts wait without limit, which keeps the deadline arithmetic
-  // far from the clock's range.
-  constexpr absl::Duration kLongestFiniteWait = absl::Hours(24 * 365 * 100);
-  if (timeout >= kLongestFiniteWait) timeout = absl::InfiniteDuration();
-  const bool has_deadline = timeout > absl::ZeroDuration() && timeout != absl::InfiniteDuration();
-  const Clock::time_point deadline =
-      has_deadline ? Clock::now() + absl::ToChronoNanoseconds(timeout) : Clock::time_point();
+  const bool poll = timeout <= absl::ZeroDuration();
+  const absl::Duration deadline = poll ? timeout : fence_internal::SteadyNow() + timeout;
   Status first_error;
   for (const T& fence : fences) {
     if (fence == nullptr) continue;
-    // A fence is polled first, so that done fences cost no clock reading.
-    FenceWaitResult result = fence->WaitForDone(absl::ZeroDuration());
-    if (std::holds_alternative<orvex_api::FenceNotDone>(result) && timeout > absl::ZeroDuration()) {
-      absl::Duration fence_timeout = timeout;
-      if (has_deadline) {
-        // Fences reached after the deadline are polled.
-        fence_timeout = std::max(absl::ZeroDuration(), absl::FromChrono(deadline - Clock::now()));
-      }
-      result = fence->WaitForDone(fence_timeout);
-    }
+    FenceWaitResult result =
+        poll ? fence->WaitForDone(timeout) : fence_internal::WaitForDoneUntil(*fence, deadline);
     Status* status = std::get_if<Status>(&result);
     if (status == nullptr) return orvex_api::FenceNotDone{};
     if (first_error.ok() && !status->ok()) first_error = std::move(*status);
@@ -114,7 +106,9 @@ class ORVEX_EXPORT MergedFence final : public Fence,
   friend std::shared_ptr<MergedFence> MergeFences(std::vector<Fence*> fences);
 
   void Register();
-  void CallListeners();
+  // Moves the pending listeners (once) into `called` and calls them with the
+  // merged status; rethrows the first exception one of them threw.
+  void CallListeners(std::vector<FenceListener>& called);
 
   std::mutex mutex_;
   std::once_flag registration_once_;

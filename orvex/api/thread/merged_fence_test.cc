@@ -3,6 +3,7 @@
 #include <atomic>
 #include <chrono>
 #include <memory>
+#include <stdexcept>
 #include <string>
 #include <thread>
 #include <variant>
@@ -13,21 +14,22 @@
 #include "gmock/gmock.h"
 #include "gtest/gtest.h"
 #include "orvex/api/thread/fence.h"
+#include "orvex/api/thread/fence_testing.h"
 #include "orvex/api/thread/two_stage_software_fence.h"
 #include "orvex/status/status_matchers.h"
 
 namespace orvex {
 namespace {
 
+using ::orvex::testing::Done;
+using ::orvex::testing::NotDone;
+using ::orvex::testing::RecordingFence;
 using ::orvex::testing::StatusIs;
 using ::testing::ElementsAre;
+using ::testing::IsEmpty;
 
 const Status kE1 = DataLossError("e1");
 const Status kE2 = CancelledError("e2");
-
-bool NotDone(const FenceWaitResult& r) {
-  return std::holds_alternative<orvex_api::FenceNotDone>(r);
-}
 
 // Records every listener call of a merged fence.
 struct Calls {
@@ -35,13 +37,6 @@ struct Calls {
   FenceListener Listener() {
     return [this](Status s) { texts.push_back(s.ToString()); };
   }
-};
-
-// Keeps the base AddListener (refuses listeners).
-class RefusingFence : public Fence {
- public:
-  FenceWaitResult WaitForDone(absl::Duration) const override { return OkStatus(); }
-  void Abort() override {}
 };
 
 TEST(MergedFenceTest, EmptyAndNullEntriesCountAsDone) {
@@ -75,26 +70,54 @@ TEST(MergedFenceTest, FirstErrorInFenceOrderWins) {
   EXPECT_THAT(calls.texts, ElementsAre(kE1.ToString(), kE1.ToString()));
 }
 
-TEST(MergedFenceTest, SharedDeadlinePollsLaterFences) {
-  SoftwareFence slow, done;
+// Each covered fence is called once, with the caller's own poll or infinite
+// wait, or with the time left until the common deadline.
+TEST(MergedFenceTest, EachFenceGetsOneWaitWithItsShareOfTheTimeout) {
+  const absl::Duration ms = absl::Milliseconds(1), inf = absl::InfiniteDuration();
+  SoftwareFence done, pending;
+  TwoStageSoftwareFence two_stage_done, two_stage_pending;
   done.Signal(OkStatus());
-  std::thread signaller([&] {
-    std::this_thread::sleep_for(std::chrono::milliseconds(50));
-    slow.Signal(OkStatus());
-  });
-  EXPECT_TRUE(
-      NotDone(WaitForMultipleFencesDone(std::vector<Fence*>{&slow, &done}, absl::Milliseconds(5))));
-  EXPECT_TRUE(
-      NotDone(WaitForMultipleFencesDone(std::vector<Fence*>{&done, &slow}, absl::ZeroDuration())));
-  EXPECT_TRUE(std::get<Status>(WaitForMultipleFencesDone(std::vector<Fence*>{&slow, &done},
-                                                         absl::InfiniteDuration()))
-                  .ok());
-  signaller.join();
+  ASSERT_TRUE(two_stage_done.SignalDone(kE1).ok());
+  // `first` sleeps `delay` and answers `result`; `second` comes after done
+  // fences of both kinds (and `pending`, if any, after `first`).
+  const struct {
+    absl::Duration timeout;
+    FenceWaitResult result;
+    absl::Duration delay;
+    Fence* pending;
+    bool done;
+    absl::Duration first_min;  // up to `timeout`
+    size_t second_calls;
+    absl::Duration second_min, second_max;
+  } cases[] = {
+      {-3 * ms, OkStatus(), ms, nullptr, true, -3 * ms, 1, -3 * ms, -3 * ms},
+      {0 * ms, OkStatus(), ms, nullptr, true, 0 * ms, 1, 0 * ms, 0 * ms},
+      {inf, OkStatus(), ms, nullptr, true, inf, 1, inf, inf},
+      {20 * ms, OkStatus(), ms, nullptr, true, 15 * ms, 1, absl::Nanoseconds(1), 19 * ms},
+      {20 * ms, OkStatus(), 30 * ms, nullptr, true, 15 * ms, 1, 0 * ms, 0 * ms},  // past deadline
+      {20 * ms, orvex_api::FenceNotDone{}, ms, nullptr, false, 15 * ms, 0, {}, {}},
+      {5 * ms, OkStatus(), ms, &pending, false, 4 * ms, 0, {}, {}},  // `pending` times out
+      {5 * ms, OkStatus(), ms, &two_stage_pending, false, 4 * ms, 0, {}, {}},
+  };
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.timeout);
+    RecordingFence first(c.result, c.delay), second;
+    std::vector<Fence*> fences = {&first, c.pending, &done, &two_stage_done, &second};
+    EXPECT_EQ(Done(MergeFences(fences)->WaitForDone(c.timeout)),
+              c.done ? kE1 : InternalError("not done"));
+    ASSERT_EQ(first.timeouts.size(), 1u);
+    EXPECT_GE(first.timeouts[0], c.first_min);
+    EXPECT_LE(first.timeouts[0], c.timeout);
+    ASSERT_EQ(second.timeouts.size(), c.second_calls);
+    if (c.second_calls == 0) continue;
+    EXPECT_GE(second.timeouts[0], c.second_min);
+    EXPECT_LE(second.timeouts[0], c.second_max);
+  }
 }
 
 TEST(MergedFenceTest, RefusedRegistrationIsReturnedAndListenerNeverCalled) {
   SoftwareFence a;
-  RefusingFence refusing;
+  RecordingFence refusing;
   auto merged = MergeFences({&a, &refusing});
   Calls calls;
   EXPECT_THAT(merged->AddListener(calls.Listener()), StatusIs(StatusCode::kUnimplemented));
@@ -103,37 +126,52 @@ TEST(MergedFenceTest, RefusedRegistrationIsReturnedAndListenerNeverCalled) {
   EXPECT_TRUE(calls.texts.empty());
 }
 
-TEST(MergedFenceTest, OutlivesItsOwnerUntilEveryFenceCalledBack) {
-  SoftwareFence a, b;
-  Calls calls;
-  std::weak_ptr<MergedFence> weak;
-  {
-    auto merged = MergeFences({&a, &b});
-    weak = merged;
-    ASSERT_TRUE(merged->AddListener(calls.Listener()).ok());
+// Merged listeners are destroyed after the last covered fence's signal, so
+// they may own the fences; one that throws keeps no other from running, and
+// its exception reaches that signaller.
+TEST(MergedFenceTest, ListenersMayOwnTheirFencesAndThrow) {
+  for (bool two_stage_last : {false, true}) {
+    SCOPED_TRACE(two_stage_last);
+    auto software = std::make_shared<SoftwareFence>();
+    auto two_stage = std::make_shared<TwoStageSoftwareFence>();
+    SoftwareFence* s = software.get();
+    TwoStageSoftwareFence* t = two_stage.get();
+    std::weak_ptr<SoftwareFence> weak = software;
+    std::vector<std::string> calls;
+    {
+      auto merged = MergeFences({s, t});
+      ASSERT_TRUE(merged->AddListener([&](Status) { throw std::runtime_error("listener"); }).ok());
+      ASSERT_TRUE(merged
+                      ->AddListener([&calls, software, two_stage](Status status) {
+                        calls.push_back(status.ToString());
+                      })
+                      .ok());
+    }
+    software.reset();
+    two_stage.reset();
+    ASSERT_TRUE(t->SignalReadyToStart(OkStatus()).ok());
+    if (two_stage_last) s->Signal(kE1);
+    EXPECT_TRUE(two_stage_last || t->SignalDone(kE2).ok());
+    EXPECT_THROW(two_stage_last ? (void)t->SignalDone(kE2) : s->Signal(kE1), std::runtime_error);
+    EXPECT_THAT(calls, ElementsAre(kE1.ToString()));
+    EXPECT_TRUE(weak.expired());
   }
-  EXPECT_FALSE(weak.expired());
-  a.Signal(OkStatus());
-  b.Signal(OkStatus());
-  EXPECT_TRUE(weak.expired());
-  EXPECT_THAT(calls.texts, ElementsAre("OK"));
 }
 
+// Over two-stage fences, whose Abort calls no listener, the listener waits
+// for a SignalDone.
 TEST(MergedFenceTest, AbortReachesCoveredFences) {
   SoftwareFence s1, s2;
-  auto software = MergeFences({&s1, &s2});
-  Calls software_calls;
-  ASSERT_TRUE(software->AddListener(software_calls.Listener()).ok());
-  software->Abort();
-  EXPECT_THAT(software_calls.texts, ElementsAre("ABORTED: Fence was aborted"));
-
   TwoStageSoftwareFence t1, t2;
-  auto two_stage = MergeFences({&t1, &t2});
-  Calls two_stage_calls;
-  ASSERT_TRUE(two_stage->AddListener(two_stage_calls.Listener()).ok());
-  two_stage->Abort();
-  EXPECT_TRUE(two_stage_calls.texts.empty());  // a two-stage abort calls no listener
-  EXPECT_THAT(two_stage->GetFenceStatus(), StatusIs(StatusCode::kAborted, "Fence was aborted"));
+  const std::pair<std::shared_ptr<MergedFence>, size_t> cases[] = {{MergeFences({&s1, &s2}), 1},
+                                                                   {MergeFences({&t1, &t2}), 0}};
+  for (const auto& [merged, listener_calls] : cases) {
+    Calls calls;
+    ASSERT_TRUE(merged->AddListener(calls.Listener()).ok());
+    merged->Abort();
+    EXPECT_THAT(merged->GetFenceStatus(), StatusIs(StatusCode::kAborted, "Fence was aborted"));
+    EXPECT_EQ(calls.texts, std::vector<std::string>(listener_calls, "ABORTED: Fence was aborted"));
+  }
 }
 
 TEST(MergedFenceTest, TrySignalReachesSoftwareKindsOnly) {

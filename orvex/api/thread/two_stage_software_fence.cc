@@ -1,6 +1,7 @@
 #include "orvex/api/thread/two_stage_software_fence.h"
 
 #include <atomic>
+#include <exception>
 #include <mutex>
 #include <optional>
 #include <string>
@@ -22,11 +23,23 @@ TwoStageSoftwareFence::~TwoStageSoftwareFence() {
 FenceWaitResult TwoStageSoftwareFence::WaitForDone(absl::Duration timeout) const {
   PerfTrace trace(5, "TwoStageSoftwareFence WaitForDone");
   std::unique_lock<std::mutex> lock(mutex_);
-  if (timeout <= absl::ZeroDuration()) {
-    if (done_status_.has_value()) return *done_status_;
-    return orvex_api::FenceNotDone{};
-  }
-  // A blocked waiter wakes only once every listener of SignalDone has run.
+  // A wait that begins once the fence is done returns at once, also one that
+  // a listener of SignalDone makes on its own thread.
+  if (done_status_.has_value()) return *done_status_;
+  return WaitLocked(lock, timeout);
+}
+
+FenceWaitResult TwoStageSoftwareFence::WaitUntil(absl::Duration deadline) const {
+  PerfTrace trace(5, "TwoStageSoftwareFence WaitForDone");
+  std::unique_lock<std::mutex> lock(mutex_);
+  if (done_status_.has_value()) return *done_status_;
+  return WaitLocked(lock, fence_internal::TimeLeft(deadline));
+}
+
+FenceWaitResult TwoStageSoftwareFence::WaitLocked(std::unique_lock<std::mutex>& lock,
+                                                  absl::Duration timeout) const {
+  if (timeout <= absl::ZeroDuration()) return orvex_api::FenceNotDone{};
+  // A waiter blocked before SignalDone wakes once every listener has run.
   const auto done = [this] { return done_status_.has_value() && listeners_running_ == 0; };
   const auto deadline = fence_internal::DeadlineAfter(timeout, absl::Milliseconds(1));
   if (!deadline.has_value()) {
@@ -120,13 +133,12 @@ Status TwoStageSoftwareFence::SignalDone(Status status) {
       ++listeners_running_;
     }
   }
+  std::exception_ptr thrown;
   if (!listeners.empty()) {
     {
       fence_internal::ListenerScope scope(this);
       // `status` was reassigned from the stored status when listeners were taken.
-      for (FenceListener& listener : listeners) {
-        fence_internal::CallListener(listener, status);  // NOLINT(bugprone-use-after-move)
-      }
+      thrown = fence_internal::CallListeners(listeners, status);  // NOLINT(bugprone-use-after-move)
     }
     std::lock_guard<std::mutex> lock(mutex_);
     --listeners_running_;
@@ -134,6 +146,8 @@ Status TwoStageSoftwareFence::SignalDone(Status status) {
   // Waiters wake after every listener has returned.
   cond_.notify_all();
   active.reset();
+  // The fence is complete; from here on it may already be destroyed.
+  if (thrown != nullptr) std::rethrow_exception(thrown);
   return OkStatus();
 }
 

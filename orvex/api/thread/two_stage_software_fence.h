@@ -13,8 +13,10 @@
 // (both errors) and done after an OK start (ready OK, done error). An error
 // at either stage, Abort() or a forfeit completes the fence. Listeners run
 // only inside SignalDone() (on its thread, in the order added, before waiters
-// wake) or at once in AddListener() when the fence is done. Waits round a
-// finite timeout up to whole milliseconds.
+// blocked in WaitForDone() wake) or at once in AddListener() when the fence
+// is done. A wait that begins once its stage is over (also one made by a
+// listener) returns at once. Waits round a finite timeout up to whole
+// milliseconds. A listener that throws: see fence.h.
 //
 // Thread safety: every operation may be called from any thread.
 
@@ -55,7 +57,8 @@ class ORVEX_EXPORT TwoStageSoftwareFence : public Fence {
   // fence. FAILED_PRECONDITION when an OK would replace a stored status.
   Status SignalReadyToStart(Status status);
 
-  // Completes the fence with `status` and calls the pending listeners.
+  // Completes the fence with `status` and calls the pending listeners, then
+  // wakes waiters and destroys the listeners (which may own the fence).
   // FAILED_PRECONDITION for an OK before ready-to-start, or for a second
   // signal when either status is OK.
   Status SignalDone(Status status);
@@ -72,6 +75,15 @@ class ORVEX_EXPORT TwoStageSoftwareFence : public Fence {
   Status GetReadyToStartStatus() const;
 
  private:
+  friend FenceWaitResult fence_internal::WaitForDoneUntil(const Fence&, absl::Duration);
+
+  // WaitForDone with the time left until `deadline` (see WaitForDoneUntil),
+  // read only when the fence is not done. Hidden: bound within the library.
+  [[gnu::visibility("hidden")]] FenceWaitResult WaitUntil(absl::Duration deadline) const;
+  // The blocking part of a wait for done, entered with `lock` held on a
+  // fence not yet done.
+  [[gnu::visibility("hidden")]] FenceWaitResult WaitLocked(std::unique_lock<std::mutex>& lock,
+                                                           absl::Duration timeout) const;
   // Waits until ready_to_start_status_ is engaged; false on timeout.
   bool WaitForReadyLocked(std::unique_lock<std::mutex>& lock, absl::Duration timeout) const;
   static Status ReadyTimeoutError(absl::Duration timeout);

@@ -22,28 +22,49 @@ template <typename Base, typename Element>
 class HeapStorage final : public Base {
  public:
   explicit HeapStorage(const decltype(Base::desc)& storage_desc)
-      : storage_(std::make_shared<Element[]>(static_cast<size_t>(storage_desc.GetBufferSize()) /
-                                             sizeof(Element))) {
+      : elements_(static_cast<size_t>(storage_desc.GetBufferSize()) / sizeof(Element)),
+        storage_(std::make_shared<Element[]>(elements_)) {
     this->desc = storage_desc;
   }
   void* GetPointer() override { return storage_.get(); }
   const void* GetPointer() const override { return storage_.get(); }
+  // The allocation, which a later change of `desc` does not follow.
+  int64_t elements() const { return static_cast<int64_t>(elements_); }
 
  private:
+  size_t elements_;
   std::shared_ptr<Element[]> storage_;
 };
 using HeapGrid = HeapStorage<LocalToneMappingDataV1::Grid, uint16_t>;
 using HeapGuideCurve = HeapStorage<LocalToneMappingDataV1::GuideCurve, float>;
 
-// True when every slope and bias element addressed by `d` lies inside the
-// d.GetBufferSize() bytes of binary16 storage.
-bool GridLayoutFits(const LocalToneMappingDataV1::GridDesc& d) {
+// The elements the library knows `storage` to hold: a heap grid's or heap
+// guide curve's allocation. -1 for a caller's own storage, which must cover
+// whatever its description addresses.
+template <typename Heap, typename Storage>
+int64_t KnownElements(const Storage& storage) {
+  const auto* heap = dynamic_cast<const Heap*>(&storage);
+  return heap == nullptr ? -1 : heap->elements();
+}
+
+// True when `grid` has binary16 elements, at least two channels, a cell in
+// each dimension and no negative stride, and, where its storage is known,
+// every slope and bias element its strides address lies inside it.
+bool GridLayoutFits(const LocalToneMappingDataV1::Grid& grid) {
+  const LocalToneMappingDataV1::GridDesc& d = grid.desc;
   if (d.width <= 0 || d.height <= 0 || d.depth <= 0 || d.channels < 2) return false;
   if (d.element_size != 2) return false;
   if (d.stride_x < 0 || d.stride_y < 0 || d.stride_z < 0 || d.stride_channel < 0) return false;
+  const int64_t known = KnownElements<HeapGrid>(grid);
   const int64_t last = int64_t{d.stride_x} * (d.width - 1) + int64_t{d.stride_y} * (d.height - 1) +
                        int64_t{d.stride_z} * (d.depth - 1) + d.stride_channel;
-  return last < d.GetBufferSize() / d.element_size;
+  return known < 0 || last < known;
+}
+
+// True when the guide curve's entries fit its storage, where that is known.
+bool GuideCurveFits(const LocalToneMappingDataV1::GuideCurve& curve) {
+  const int64_t known = KnownElements<HeapGuideCurve>(curve);
+  return known < 0 || curve.desc.num_entries <= known;
 }
 
 // Storage may come from any producer, so elements are read without
@@ -129,8 +150,9 @@ uint16_t FloatToHalf(float value) {
 void LocalToneMappingDataV1::SetIdentity() {
   ORVEX_CHECK(grid != nullptr && guide_curve != nullptr);
   const GridDesc& d = grid->desc;
-  ORVEX_CHECK(GridLayoutFits(d)) << "grid layout does not fit its storage";
+  ORVEX_CHECK(GridLayoutFits(*grid)) << "grid layout does not fit its storage";
   ORVEX_CHECK(guide_curve->desc.entry_size == 4 && guide_curve->desc.num_entries >= 0);
+  ORVEX_CHECK(GuideCurveFits(*guide_curve)) << "guide curve entries do not fit its storage";
   auto* base = static_cast<unsigned char*>(grid->GetPointer());
   auto* curve = static_cast<unsigned char*>(guide_curve->GetPointer());
   ORVEX_CHECK(base != nullptr && curve != nullptr);
@@ -186,7 +208,11 @@ Status LocalToneMappingDataV1::GetGlobalToneMap(int n, float* gain_lut) const {
     return InvalidArgumentErrorBuilder(ORVEX_LOC)
            << "Empty guide curve: " << gd.num_entries << " entries";
   }
-  if (!GridLayoutFits(d)) {
+  if (!GuideCurveFits(*guide_curve)) {
+    return InvalidArgumentErrorBuilder(ORVEX_LOC)
+           << "Guide curve entries outside the guide curve buffer";
+  }
+  if (!GridLayoutFits(*grid)) {
     return InvalidArgumentErrorBuilder(ORVEX_LOC)
            << "Grid strides address elements outside the grid buffer";
   }

@@ -55,7 +55,10 @@ struct ORVEX_EXPORT LocalToneMappingDataV1 {
     int64_t GetBufferSize() const;
   };
 
-  // Grid storage: desc.GetBufferSize() bytes of binary16 elements.
+  // Grid storage of binary16 elements, addressed through desc's strides.
+  // The library's heap grid holds desc.GetBufferSize() bytes of the default
+  // description; any other implementation's storage must cover every element
+  // its strides address (padded rows and bins are fine).
   class ORVEX_EXPORT Grid {
    public:
     virtual ~Grid();
@@ -65,7 +68,8 @@ struct ORVEX_EXPORT LocalToneMappingDataV1 {
     GridDesc desc;
   };
 
-  // Guide-curve storage: desc.num_entries 32-bit floats.
+  // Guide-curve storage: desc.num_entries 32-bit floats, which any
+  // implementation's storage must hold.
   class ORVEX_EXPORT GuideCurve {
    public:
     virtual ~GuideCurve();
@@ -76,8 +80,9 @@ struct ORVEX_EXPORT LocalToneMappingDataV1 {
   };
 
   // Sets every slope to 1.0, every bias to 0 and every guide-curve entry to
-  // 1.0. Requires a grid of binary16 elements with at least two channels
-  // laid out inside its storage, and a float guide curve.
+  // 1.0. Requires a grid of binary16 elements with at least two channels and
+  // no negative stride, and a float guide curve; for the heap storage, the
+  // descriptions must stay inside the allocation (fatal otherwise).
   void SetIdentity();
 
   // Reduces the grid to one global tone curve and writes it as gains:
@@ -87,9 +92,9 @@ struct ORVEX_EXPORT LocalToneMappingDataV1 {
   //
   // Returns INVALID_ARGUMENT, leaving gain_lut untouched, for an element size
   // other than 2, an entry size other than 4, missing storage, a channel
-  // count other than 2, n < 1, an empty grid or guide curve, or strides that
-  // address elements outside the grid's storage. `gain_lut` must not be null
-  // (checked, fatal) and must hold n entries.
+  // count other than 2, n < 1, an empty grid or guide curve, a negative
+  // stride, or heap storage that the descriptions outrun. `gain_lut` must
+  // not be null (checked, fatal) and must hold n entries.
   Status GetGlobalToneMap(int n, float* gain_lut) const;
 
   std::shared_ptr<Grid> grid;
