@@ -206,6 +206,8 @@ TEST(ArgsTest, ParsesFlagShapesAndRefusesBadArguments) {
 TEST(ArgsTest, ParsesNumbers) {
   EXPECT_THAT(ParseCode("4294967295", "FORMAT"), IsOkAndHolds(0xffffffffu));
   EXPECT_THAT(ParseSize("640X480", "--size"), IsOkAndHolds(orvex::GenericSize<int>{640, 480}));
+  EXPECT_THAT(ParseInteger("10", "N", 1, 10), IsOkAndHolds(10));  // both bounds are allowed
+  EXPECT_THAT(ParseLevelRange("3:3", 31), IsOkAndHolds(orvex_api::Range<int>{3, 3}));
   const std::string code = "FORMAT must be a name or a decimal or 0x-hexadecimal code, got ";
   const std::pair<orvex::Status, std::string> failures[] = {
       {ParseInteger("12abc", "N", 1, 10).status(), "N must be a whole number, got '12abc'"},
@@ -317,7 +319,9 @@ TEST(FormatsTest, TableAndJson) {
       Call({"formats"}, kExitOk,
            AllOf(StartsWith(
                      "       HEX     DECIMAL  NAME                                            BPP "
-                     " COMPRESSION                    64B  UNCOMPRESSED\n"),
+                     " COMPRESSION                    64B  UNCOMPRESSED\n"
+                     "       0x3           3  RGB_888                                       "
+                     "    8  None                           no   same\n"),
                  HasSubstr(
                      "\n0x4000000b  1073741835  YCBCR_420_SP_M_S10B_SBWC_STRIDE_ALIGNED_64      "
                      " 10  SBWC                           yes  "
@@ -414,12 +418,16 @@ TEST(LayoutTest, SvgDrawsEveryBufferAndComponentToScale) {
   EXPECT_THAT(svg, HasSubstr("<rect x=\"20\" y=\"70\" width=\"720.00\" height=\"78\""));
   for (const std::string label : {"Luma", "ChromaB", "ChromaR"}) {
     EXPECT_THAT(svg, AllOf(HasSubstr(">" + label + "</text>"),
-                           HasSubstr(">" + label + ": offset 0, 4147200 bytes")));
+                           ContainsRegex("<text x=\"36\" y=\"[0-9]+\" font-size=\"11\">" + label +
+                                         ": offset 0, 4147200 bytes")));
   }
   // Two buffers drawn to one scale: the chroma bar is half the luma bar.
   ASSERT_EQ(RunOrvex({"layout", "64", "32", "YCBCR_420_888", "--svg", path}).code, kExitOk);
   EXPECT_THAT(ReadFile(path), AllOf(HasSubstr("width=\"720.00\""), HasSubstr("width=\"360.00\""),
                                     HasSubstr(">buffer 1: 1024 bytes</text>")));
+  // Planes that only touch share a lane.
+  ASSERT_EQ(RunOrvex({"layout", "64", "32", "YV12", "--svg", path}).code, kExitOk);
+  EXPECT_THAT(ReadFile(path), HasSubstr("width=\"720.00\" height=\"26\" fill=\"#f4f4f4\""));
   EXPECT_EQ(XmlEscape("a<b>&\"c"), "a&lt;b&gt;&amp;&quot;c");
 }
 
@@ -550,6 +558,7 @@ TEST(CpaTest, HostileInputIsBoundedAndEscaped) {
   operation->add_latency_data()->set_event_name(std::string("A\0B\xc2\x9b\\", 6));
   const std::string path = dir.File("names.cpa");
   WriteFile(path, file.SerializeAsString());
+  EXPECT_THAT(ReadCpaFile(path, file.ByteSizeLong()).status(), IsOk());  // a file at the limit
   const TextMatcher escaped =
       AllOf(HasSubstr("\\x1b]0;owned\\x07Open"), HasSubstr("A\\x00B\\u009b\\\\"),
             Not(ContainsRegex("[\x1b\x07]")), Not(HasSubstr(std::string(1, '\0'))));
@@ -594,6 +603,8 @@ TEST(CpaTest, ManySessionsWrittenByTheAnalyzer) {
   const std::string chart = ReadFile(svg);
   EXPECT_EQ(CountElements(chart, "circle"), 6);
   EXPECT_EQ(CountElements(chart, "circle", "fill", "#c0392b"), 1);
+  EXPECT_THAT(chart, HasSubstr(">Camera-Open: Overall per session (threshold 300 ms, 1 of 3 at or "
+                               "over)</text>"));
 }
 
 // Runs `body` in a child process whose writes may not take a file past 16
