@@ -117,30 +117,27 @@ void WriteFile(const std::string& path, const std::string& bytes) {
 }
 
 // A scratch directory removed with its files at the end of the test.
-class ScratchDir {
- public:
+struct ScratchDir {
   ScratchDir() {
     char pattern[] = "/tmp/orvex_tool_test.XXXXXX";
-    if (mkdtemp(pattern) != nullptr) path_ = pattern;
-    if (path_.empty()) ADD_FAILURE() << "mkdtemp failed";
+    if (mkdtemp(pattern) != nullptr) path = pattern;
+    if (path.empty()) ADD_FAILURE() << "mkdtemp failed";
   }
   ~ScratchDir() {
     std::error_code ignored;
-    if (!path_.empty()) std::filesystem::remove_all(path_, ignored);
+    if (!path.empty()) std::filesystem::remove_all(path, ignored);
   }
-  const std::string& path() const { return path_; }
-  std::string File(const std::string& name) const { return path_ + "/" + name; }
+  std::string File(const std::string& name) const { return path + "/" + name; }
   // The names of the entries.
   std::set<std::string> Names() const {
     std::set<std::string> names;
-    for (const auto& entry : std::filesystem::directory_iterator(path_)) {
+    for (const auto& entry : std::filesystem::directory_iterator(path)) {
       names.insert(entry.path().filename());
     }
     return names;
   }
 
- private:
-  std::string path_;
+  std::string path;
 };
 
 // The number of `name` elements in `xml` (only those with attribute `key`
@@ -382,6 +379,7 @@ TEST(LayoutTest, OutputAndExitStatus) {
            AllOf(StartsWith("{\n"), EndsWith("}\n")),
            ContainsRegex("^conformance to Y10: INVALID_ARGUMENT: [^\n]+\n$")),
       Fails({"layout", "64", "64", "0x1234"}, StartsWith("UNIMPLEMENTED: Unsupported")),
+      Misuse({"layout", "abc", "64", "RAW10"}, "WIDTH must be a whole number, got 'abc'"),
       Misuse({"layout", "64", "-2", "RAW10"}, "HEIGHT must be between 1 and 2147483647, got -2"),
       Misuse({"layout", "64", "64", "NOPE"},
              "unknown FORMAT 'NOPE' (see 'orvex formats' for the names, or give a code)"),
@@ -397,8 +395,8 @@ TEST(LayoutTest, OutputAndExitStatus) {
             "UNIMPLEMENTED: Unable to check if conforms to UnknownFormat_0x1234\n"),
       Fails({"layout", "64", "32", "YV12", "--svg", missing},
             "NOT_FOUND: cannot write " + missing + ": No such file or directory\n"),
-      Fails({"layout", "64", "32", "YV12", "--svg", dir.path()},
-            "FAILED_PRECONDITION: cannot write " + dir.path() + ": Is a directory\n"),
+      Fails({"layout", "64", "32", "YV12", "--svg", dir.path},
+            "FAILED_PRECONDITION: cannot write " + dir.path + ": Is a directory\n"),
       Fails({"layout", "64", "32", "YV12", "--svg", "/dev/full"},
             "RESOURCE_EXHAUSTED: cannot write /dev/full: No space left on device\n"),
   });
@@ -568,7 +566,7 @@ TEST(CpaTest, HostileInputIsBoundedAndEscaped) {
 TEST(CpaTest, ManySessionsWrittenByTheAnalyzer) {
   ScratchDir dir;
   orvex::CameraLatencyAnalyzer& analyzer = orvex::CameraLatencyAnalyzer::GetAnalyzer();
-  analyzer.SetOutputDirectory(dir.path());
+  analyzer.SetOutputDirectory(dir.path);
   ASSERT_EQ(property_set(orvex::kCameraPerformanceAnalyzerWriteToDiskProperty, "true"), 0);
   for (float open_ms : {100.0f, 350.0f, 200.0f}) {
     analyzer.InjectEvent("Camera-Open", {{"Overall", open_ms}, {"SensorPowerUp", 40.0f}});
@@ -581,7 +579,7 @@ TEST(CpaTest, ManySessionsWrittenByTheAnalyzer) {
                               " is not a valid .cpa file: it does not parse as a "
                               "CameraPerformanceDataFile message (22 bytes)\n";
   ExpectCalls({
-      Call({"cpa", dir.path(), "--svg", svg}, kExitError,
+      Call({"cpa", dir.path, "--svg", svg}, kExitError,
            AllOf(StartsWith("3 sessions, "),
                  HasSubstr("\nCamera-Open (3 sessions, threshold 300 ms: 1 over)\n"
                            "EVENT          COUNT  MIN (ms)  MEDIAN (ms)  P90 (ms)  MAX (ms)\n"
@@ -592,9 +590,9 @@ TEST(CpaTest, ManySessionsWrittenByTheAnalyzer) {
                  ContainsRegex("\nsessions in time order:\nTIME +FILE +OPERATIONS +OVER THRESHOLD\n"
                                "[^\n]+  2  -\n[^\n]+  2  Camera-Open\n[^\n]+  2  -\n$")),
            skipped),
-      Call({"cpa", dir.path(), "--svg", "/dev/full"}, kExitError, StartsWith("3 sessions, "),
+      Call({"cpa", dir.path, "--svg", "/dev/full"}, kExitError, StartsWith("3 sessions, "),
            skipped + "RESOURCE_EXHAUSTED: cannot write /dev/full: No space left on device\n"),
-      Call({"cpa", dir.path() + "/", "--json"}, kExitError,
+      Call({"cpa", dir.path + "/", "--json"}, kExitError,
            HasSubstr("{\"event\": \"Overall\", \"count\": 3, \"min_ms\": 100, \"median_ms\": 200, "
                      "\"p90_ms\": 350, \"max_ms\": 350}"),
            skipped),
@@ -720,14 +718,14 @@ TEST(DemoTest, EveryPlaneOfEveryLayoutFamilyIsVerified) {
   for (const Case& c : cases) {
     SCOPED_TRACE(orvex::FormatToString(c.format));
     // 5 frames of 64x32 into `dir`, no progress, no dump.
-    auto report = RunDemo({{64, 32}, c.format, 5, dir.path(), nullptr, "", c.corrupt});
+    auto report = RunDemo({{64, 32}, c.format, 5, dir.path, nullptr, "", c.corrupt});
     ASSERT_THAT(report.status(), IsOk());
     EXPECT_EQ(report->frames_processed, 5);
     EXPECT_EQ(report->frames_verified, 5 - static_cast<int>(c.failures.size()));
     EXPECT_EQ(report->planes_checked, 5 * c.planes);
     EXPECT_EQ(report->failures, c.failures);
     EXPECT_EQ(report->wake_latencies.size(), 5u);
-    EXPECT_THAT(report->cpa_path, StartsWith(dir.path() + "/camera-ended-"));
+    EXPECT_THAT(report->cpa_path, StartsWith(dir.path + "/camera-ended-"));
   }
 }
 
@@ -795,7 +793,7 @@ TEST(DemoDeathTest, NamesOnlyTheProfileItWrote) {
         });
         std::string errors;
         for (int run = 0; run < 5; ++run) {
-          errors += RunOrvex({"demo", "--size", "64x32", "--frames", "1", "--out", dir.path()}).err;
+          errors += RunOrvex({"demo", "--size", "64x32", "--frames", "1", "--out", dir.path}).err;
         }
         return errors;
       },
@@ -815,14 +813,13 @@ TEST(DemoTest, Errors) {
       Misuse({"demo", "--dump="}, "--dump must name a directory"),
       Misuse({"demo", "extra"}, "unexpected argument 'extra'"),
       // A trace cut short is not recommended; the run is reported.
-      Call(
-          {"demo", "--size", "64x32", "--frames", "1", "--out", dir.path(), "--trace", "/dev/full"},
-          kExitError, AllOf(HasSubstr("verification: passed"), Not(HasSubstr("trace:"))),
-          "RESOURCE_EXHAUSTED: cannot write the trace /dev/full: No space left on device\n"),
-      Fails({"demo", "--format", "RGB_888", "--out", dir.path()},
+      Call({"demo", "--size", "64x32", "--frames", "1", "--out", dir.path, "--trace", "/dev/full"},
+           kExitError, AllOf(HasSubstr("verification: passed"), Not(HasSubstr("trace:"))),
+           "RESOURCE_EXHAUSTED: cannot write the trace /dev/full: No space left on device\n"),
+      Fails({"demo", "--format", "RGB_888", "--out", dir.path},
             StartsWith("UNIMPLEMENTED: Unsupported")),
       Fails(
-          {"demo", "--size", "30000x30000", "--out", dir.path()},
+          {"demo", "--size", "30000x30000", "--out", dir.path},
           "RESOURCE_EXHAUSTED: a 30000x30000 YCBCR_420_888 frame takes 1350000000 bytes; the demo "
           "allows at most 1073741824 per frame\n"),
       Fails({"demo", "--size", "64x32", "--frames", "1", "--out", file + "/sub"},
