@@ -8,9 +8,8 @@
 namespace orvex {
 namespace {
 
-// One name per text function; a value past its table reads as "Unknown" (the
-// tables share one lookup), any non-zero security or cached byte as "Secure"
-// or "UnCached".
+// One name per text function; past its table (one lookup serves all) a value reads
+// "Unknown", a non-zero security or cached byte "Secure" or "UnCached".
 TEST(BufferAttributesTest, Texts) {
   const std::pair<std::string_view, std::string_view> cases[] = {
       {TransportToString(BufferTransport::kOpaque), "Opaque"},
