@@ -31,30 +31,38 @@ using ::testing::ElementsAre;
 using ::testing::MatchesRegex;
 using enum BufferAccessMode;
 using enum StatusCode;
+using enum BufferCompression;
 
 TEST(HeapBufferTest, ElementTypes) {
-  EXPECT_THAT(HeapBuffer<uint8_t>::Make(10, BufferCompression::kSbwc, nullptr).value()->DebugStr(),
-              MatchesRegex("\\{type: HeapBuffer, Size: 10, Addr: 0x[0-9a-f]+, ElementSize: 1, "
-                           "Attributes: Transport: Heap, Access: CPU, Security: None, "
-                           "Compression: SBWC\\}"));
-  auto words = HeapBuffer<int32_t>::Make(3, BufferCompression::kNone, nullptr).value();
-  EXPECT_THAT(words->DebugStr(),
-              MatchesRegex("\\{type: HeapBuffer, Size: 12, .* ElementSize: 4, .*"));
-  EXPECT_EQ(words->GetAttributes(), (BufferAttributes{BufferTransport::kHeap, BufferAccess::kCpu}));
+  const std::tuple<std::shared_ptr<Buffer>, std::string, char> cases[] = {
+      {HeapBuffer<uint8_t>::Make(10, kSbwc, nullptr).value(), "10", '1'},
+      {HeapBuffer<uint32_t>::Make(10, kSbwc, nullptr).value(), "40", '4'},
+      {HeapBuffer<int32_t>::Make(3, kSbwc, nullptr).value(), "12", '4'},
+      {HeapBuffer<float>::Make(0, kSbwc, nullptr).value(), "0", '4'},
+  };
+  for (const auto& [buffer, size, element_size] : cases) {
+    SCOPED_TRACE(size);
+    EXPECT_THAT(buffer->DebugStr(),
+                MatchesRegex("\\{type: HeapBuffer, Size: " + size +
+                             ", Addr: 0x[0-9a-f]+, ElementSize: " + element_size +
+                             ", Attributes: Transport: Heap, .*\\}"));
+    EXPECT_EQ(buffer->GetAttributes(),
+              (BufferAttributes{BufferTransport::kHeap, BufferAccess::kCpu, {}, {}, kSbwc}));
+  }
 }
 
 TEST(HeapBufferTest, SizesThatCannotBeAllocatedAreResourceExhausted) {
   constexpr uint64_t kMax = std::numeric_limits<uint64_t>::max();
   // A byte size beyond 64 bits (and the address space), and one the system cannot give.
-  EXPECT_THAT(HeapBuffer<float>::Make(kMax / 2, BufferCompression::kNone, nullptr),
+  EXPECT_THAT(HeapBuffer<float>::Make(kMax / 2, kNone, nullptr),
               StatusIs(kResourceExhausted,
                        "Cannot allocate a HeapBuffer of 9223372036854775807 elements of 4 bytes"));
-  EXPECT_THAT(HeapBuffer<int32_t>::Make(uint64_t{1} << 60, BufferCompression::kNone, nullptr),
+  EXPECT_THAT(HeapBuffer<int32_t>::Make(uint64_t{1} << 60, kNone, nullptr),
               StatusIs(kResourceExhausted));
 }
 
 TEST(HeapBufferTest, MapOffsetsAreInBytes) {
-  auto buffer = HeapBuffer<uint32_t>::Make(16, BufferCompression::kNone, nullptr).value();
+  auto buffer = HeapBuffer<uint32_t>::Make(16, kNone, nullptr).value();
   auto* base = reinterpret_cast<unsigned char*>(buffer->GetPointer().get());
   auto handle = buffer->Map(8, 16, kWrite);
   ASSERT_THAT(handle, IsOk());
@@ -92,7 +100,7 @@ TEST(BufferTest, BaseDefaultsAndFence) {
 TEST(BufferTest, CleanupsRunInReverseOrderExactlyOnce) {
   std::vector<std::string> calls;
   {
-    auto buffer = HeapBuffer<uint8_t>::Make(8, BufferCompression::kNone, nullptr).value();
+    auto buffer = HeapBuffer<uint8_t>::Make(8, kNone, nullptr).value();
     std::shared_ptr<uint8_t> array = buffer->GetPointer();
     array.get()[0] = 42;
     for (const char* name : {"A", "B", "C"}) {
@@ -111,8 +119,7 @@ TEST(BufferConcurrencyTest, CleanupsAndHandlesFromManyThreads) {
   constexpr int kThreads = 4;
   constexpr int kPerThread = 200;
   std::atomic<int> ran{0};
-  auto buffer =
-      HeapBuffer<uint8_t>::Make(kThreads * kPerThread, BufferCompression::kNone, nullptr).value();
+  auto buffer = HeapBuffer<uint8_t>::Make(kThreads * kPerThread, kNone, nullptr).value();
   std::vector<std::unique_ptr<Buffer::MappedHandle>> handles(kThreads);
   std::vector<std::thread> threads;
   for (int t = 0; t < kThreads; ++t) {

@@ -74,11 +74,11 @@ class RecordingMapper : public MmapWrapper {
     events.push_back(fmt::format("map {}", AccessModeToString(mode)));
     StatusOr<void*> address = answer ? *std::exchange(answer, std::nullopt)
                                      : MmapWrapper::MapFileDescriptor(fd, size, offset, mode);
-    if (address.ok()) modes_[*address] = AccessModeToString(mode);
+    if (address.ok()) modes[*address] = AccessModeToString(mode);
     return address;
   }
   int Unmap(void* address, uint64_t size) const override {
-    events.push_back(fmt::format("unmap {} {}", modes_[address], size));
+    events.push_back(fmt::format("unmap {} {}", modes[address], size));
     if (unmap_errno == 0) return MmapWrapper::Unmap(address, size);
     errno = std::exchange(unmap_errno, 0);
     return -1;
@@ -87,9 +87,7 @@ class RecordingMapper : public MmapWrapper {
   mutable std::vector<std::string> events;
   mutable std::optional<StatusOr<void*>> answer;
   mutable int unmap_errno = 0;
-
- private:
-  mutable std::map<void*, std::string_view> modes_;
+  mutable std::map<void*, std::string_view> modes;  // of each mapped address
 };
 
 // A RecordingMapper over a 4 KiB memfd; the process-wide state is restored.
@@ -123,8 +121,7 @@ class HwBufferTest : public ::testing::Test {
       std::exchange(HwBuffer::mapper_, std::unique_ptr<MemoryMapper>(mapper_));
 };
 
-// Nothing is mapped, registered or synchronised for a refused mapping; a failed
-// unmapping at destruction is logged, with errno kept.
+// Refusals map, register and sync nothing; a failed unmapping is logged, errno kept.
 TEST_F(HwBufferTest, MappingFailuresLeaveNoStateBehind) {
   int pipe_fds[2];
   ASSERT_EQ(pipe(pipe_fds), 0);
@@ -177,8 +174,7 @@ TEST_F(HwBufferTest, MappingFailuresLeaveNoStateBehind) {
   for (int fd : {pipe_fds[0], pipe_fds[1], read_only}) close(fd);
 }
 
-// Invalidate before the CPU reads, flush after it writes: only for cached
-// CPU-accessed DMA memory, whatever its security.
+// Invalidate before reads, flush after writes: cached CPU DMA memory only, whatever its security.
 TEST_F(HwBufferTest, CacheMaintenanceBracketsEachAccess) {
   // clang-format off
   struct Case { BufferAttributes attributes; BufferAccessMode mode; Flags at_map, at_release; };
@@ -207,7 +203,6 @@ TEST_F(HwBufferTest, CacheMaintenanceBracketsEachAccess) {
   }
 }
 
-// The handler takes partial ranges of cached buffers; whole ones ignore it.
 TEST_F(HwBufferTest, PartialMappingsUseTheHandler) {
   auto buffer = Make(fd_);
   std::vector<std::string> handled;
@@ -276,8 +271,7 @@ TEST(MmapWrapperTest, AlignOffsetTruncatesToPages) {
   }
 }
 
-// Each thread maps its own stripe, cycling through the modes, and writes its
-// number there; the buffer dies on whichever thread releases the last handle.
+// Threads map their stripes in every mode; the buffer dies with the last handle released.
 TEST_F(HwBufferTest, ConcurrentMappingOfOneBuffer) {
   constexpr int kThreads = 4;
   constexpr uint64_t kStripe = kSize / kThreads;
