@@ -67,14 +67,11 @@ TEST(StatusBuilderTest, JoinStyles) {
   EXPECT_EQ(Status(StatusBuilder(base, ORVEX_LOC) << "y").message(), "x; y");
   EXPECT_EQ(Status(StatusBuilder(base, ORVEX_LOC).SetAppend() << "y").message(), "xy");
   EXPECT_EQ(Status(StatusBuilder(base, ORVEX_LOC).SetPrepend() << "y").message(), "yx");
-  // Joined text gives the canonical code: raw 42 becomes UNKNOWN.
-  const Status odd(static_cast<StatusCode>(42), "x");
+  const Status odd(static_cast<StatusCode>(42), "x");  // joined, it reads UNKNOWN
   EXPECT_EQ(Status(StatusBuilder(odd, ORVEX_LOC).SetAppend() << "y").raw_code(), 2);
-  // Empty text: the status unchanged, record shared.
-  Status same = StatusBuilder(base, ORVEX_LOC).SetAppend() << "";
+  Status same = StatusBuilder(base, ORVEX_LOC).SetAppend() << "";  // unchanged, shared
   EXPECT_EQ(same.raw_rep_for_testing(), base.raw_rep_for_testing());
-  // A builder over OK ignores text and settings.
-  StatusBuilder ok(OkStatus(), ORVEX_LOC);
+  StatusBuilder ok(OkStatus(), ORVEX_LOC);  // ignores text and settings
   ok.Log(StatusBuilder::kError).LogEveryN(StatusBuilder::kError, 2).SetPrepend() << "text";
   ok.LogEvery(StatusBuilder::kError, absl::Seconds(1));
   EXPECT_TRUE(Status(ok).ok());

@@ -1,5 +1,6 @@
 #include "cutils/properties.h"
 
+#include <errno.h>
 #include <stdlib.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
@@ -111,6 +112,7 @@ TEST(HostPropertiesDeathTest, SeedsFromFileNamedByEnvironment) {
            Not(HasSubstr(":12:")), Not(HasSubstr(":13:")), Not(HasSubstr("read error")),
            Not(HasSubstr("\x1b")))},
       {"missing", ContainsRegex("cannot read property file .*/missing named by")},
+      {"/proc/self/mem", HasSubstr("/proc/self/mem: read error after line 0 (errno ")},
       {"fifo", refused},
       {"/dev/zero", refused}};
   for (const auto& [file, log] : cases) {
@@ -132,13 +134,14 @@ TEST(HostPropertiesDeathTest, SeedsFromFileNamedByEnvironment) {
           alarm(30);
           LimitAddressSpace();
           setenv("ORVEX_PROPERTIES_FILE", (file[0] == '/' ? file : dir + "/" + file).c_str(), 1);
+          close(STDIN_FILENO);  // the file may open as descriptor 0
+          errno = EINTR;        // left over: the end of the file still ends the read
           std::string values;
-          for (const char* key :
-               {"plain", "spaced", "empty", "equals", "nul", "huge", "edge", "last"}) {
+          for (const char* key : {"plain", "spaced", "equals", "nul", "huge", "edge", "last"}) {
             values += Get((std::string("test.seed.") + key).c_str()) + "|";
           }
           const bool ok =
-              values == (file == "seed.prop" ? "hello|two words||a=b|||1|1|" : "||||||||");
+              values == (file == "seed.prop" ? "hello|two words|a=b|||1|1|" : "|||||||");
           std::filesystem::remove_all(dir);
           _exit(ok ? 0 : 1);
         },
