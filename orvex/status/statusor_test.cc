@@ -2,7 +2,6 @@
 
 #include <memory>
 #include <string>
-#include <vector>
 
 #include "gmock/gmock.h"
 #include "gtest/gtest.h"
@@ -18,19 +17,14 @@ using ::orvex::testing::StatusIs;
 
 TEST(StatusOrTest, ValueErrorAndOkArguments) {
   StatusOr<int> v = 7;
-  EXPECT_THAT(v, IsOkAndHolds(7));
   StatusOr<int> e = NotFoundError("no");
   EXPECT_THAT(e, StatusIs(StatusCode::kNotFound, "no"));
   EXPECT_EQ(e.value_or(3), 3);
   EXPECT_THAT(StatusOr<int>(), StatusIs(StatusCode::kUnknown, ""));
-  StatusOr<std::string> built = InvalidArgumentErrorBuilder(ORVEX_LOC) << "size " << 5;
-  EXPECT_THAT(built, StatusIs(StatusCode::kInvalidArgument, "size 5"));
-
   const Status ok_replaced =
       InternalError("An OK status is not a valid constructor argument to StatusOr<T>");
   EXPECT_EQ(StatusOr<int>(OkStatus()).status(), ok_replaced);
-  StatusBuilder ok_builder(OkStatus(), ORVEX_LOC);
-  EXPECT_EQ(StatusOr<int>(ok_builder).status(), ok_replaced);
+  EXPECT_EQ(StatusOr<int>(StatusBuilder(OkStatus(), ORVEX_LOC)).status(), ok_replaced);
   v = OkStatus();
   EXPECT_EQ(v.status(), ok_replaced);
 }
@@ -41,7 +35,7 @@ TEST(StatusOrTest, CopyMoveAssignKeepsOwnership) {
   {
     StatusOr<std::shared_ptr<int>> b = a;
     StatusOr<std::shared_ptr<int>> c = std::move(b);
-    c = AbortedError("x");  // Destroys the held value.
+    c = AbortedError("x");
     EXPECT_EQ(counter.use_count(), 2);
     c = a;
     b = std::move(c);
@@ -53,7 +47,6 @@ TEST(StatusOrTest, CopyMoveAssignKeepsOwnership) {
   EXPECT_EQ(counter.use_count(), 2);
   a = NotFoundError("");
   EXPECT_EQ(counter.use_count(), 1);
-  EXPECT_TRUE(StatusOr<int>(7).status().ok());
 }
 
 TEST(StatusOrTest, Conversions) {
@@ -65,8 +58,6 @@ TEST(StatusOrTest, Conversions) {
   EXPECT_THAT(StatusOr<std::string>(text), IsOkAndHolds("abc"));
   StatusOr<int> err = DataLossError("d");
   EXPECT_THAT(StatusOr<long>(err), StatusIs(StatusCode::kDataLoss, "d"));
-  StatusOr<std::vector<int>> in_place(std::in_place, 3, 9);
-  EXPECT_THAT(in_place, IsOkAndHolds(std::vector<int>{9, 9, 9}));
 }
 
 StatusOr<int> Half(int v) {
@@ -76,29 +67,22 @@ StatusOr<int> Half(int v) {
 
 StatusOr<int> Quarter(int v) {
   ORVEX_ASSIGN_OR_RETURN(int half, Half(v));
+  ORVEX_RETURN_IF_ERROR(Half(half)) << "quarter of " << v;
+  ORVEX_RETURN_IF_ERROR(OkStatus());
   ORVEX_ASSIGN_OR_RETURN(half, Half(half));
   return half;
 }
 
-Status CheckQuarter(int v) {
-  ORVEX_RETURN_IF_ERROR(Quarter(v)) << "quarter of " << v;
-  ORVEX_RETURN_IF_ERROR(OkStatus());
-  return OkStatus();
-}
-
 TEST(StatusMacrosTest, Propagation) {
   EXPECT_THAT(Quarter(8), IsOkAndHolds(2));
-  EXPECT_THAT(Quarter(6), StatusIs(StatusCode::kInvalidArgument, "odd 3"));
-  EXPECT_THAT(CheckQuarter(8), IsOk());
-  EXPECT_THAT(CheckQuarter(6), StatusIs(StatusCode::kInvalidArgument, "odd 3; quarter of 6"));
+  EXPECT_THAT(Quarter(5), StatusIs(StatusCode::kInvalidArgument, "odd 5"));
+  EXPECT_THAT(Quarter(6), StatusIs(StatusCode::kInvalidArgument, "odd 3; quarter of 6"));
 }
 
 TEST(StatusOrDeathTest, ValueOfErrorIsFatal) {
   StatusOr<int> e = NotFoundError("missing frame");
   EXPECT_DEATH((void)e.value(),
                "Attempting to fetch value instead of handling error NOT_FOUND: missing frame");
-  const StatusOr<std::string> c = StatusOr<std::string>(AbortedError(""));
-  EXPECT_DEATH((void)c->size(), "Attempting to fetch value instead of handling error ABORTED: ");
 }
 
 }  // namespace

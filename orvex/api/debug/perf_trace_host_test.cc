@@ -2,8 +2,13 @@
 
 #include <dlfcn.h>
 
+#include <pthread.h>
+
 #include <cerrno>
 #include <cstdlib>
+#include <cstring>
+#include <fstream>
+#include <sstream>
 #include <string>
 #include <thread>
 
@@ -21,14 +26,14 @@ using ::testing::ElementsAre;
 
 const std::string kMe = " @" + std::to_string(testing::CurrentTid());
 
-void SetTags(uint64_t tags) { __atomic_store_n(&atrace_enabled_tags, tags, __ATOMIC_RELAXED); }
-
-TEST(HostTraceTest, SectionsCountersAndAsyncCookiesKeepTheirThreads) {
+// Markers keep their threads; a PerfTrace section follows the level it was made at.
+TEST(HostTraceTest, MarkersThreadsAndLevels) {
   TraceRecording recording;
   std::string worker;
   {
     ScopedTrace outer("outer \"quoted\"");
     std::thread([&] {
+      pthread_setname_np(pthread_self(), "worker");
       worker = " @" + std::to_string(testing::CurrentTid());
       ScopedTrace inner("inner");
       AsyncTraceEnd("capture", -7);
@@ -38,38 +43,10 @@ TEST(HostTraceTest, SectionsCountersAndAsyncCookiesKeepTheirThreads) {
   }
   AsyncTraceBegin("capture", 8);
   AsyncTraceEnd("capture", 8);
-  EXPECT_THAT(recording.Stop(), ElementsAre("B outer \\\"quoted\\\"" + kMe, "B inner" + worker,
-                                            "e capture #-7" + worker, "E" + worker,
-                                            "C depth =-3" + kMe, "C bytes =1099511627776" + kMe,
-                                            "E" + kMe, "b capture #8" + kMe, "e capture #8" + kMe));
-}
-
-TEST(HostTraceTest, CameraTagBitAndMarkerDescriptorGateEverything) {
-  const struct {
-    uint64_t tags;
-    size_t events;
-  } cases[] = {{ATRACE_TAG_CAMERA, 5}, {~uint64_t{ATRACE_TAG_CAMERA}, 0}, {0, 0}};
-  for (const auto& c : cases) {
-    SCOPED_TRACE(c.tags);
-    TraceRecording recording;
-    SetTags(c.tags);
-    {
-      ScopedTrace section("section");
-      ScopedTrace::TraceInt("counter", 1);
-      AsyncTraceBegin("async", 1);
-      AsyncTraceEnd("async", 1);
-    }
-    EXPECT_EQ(recording.Stop().size(), c.events);
+  // Marker texts that other writers put on the descriptor; malformed ones are dropped.
+  for (const char* text : {"B|1|begun", "C|1|n|-5", "C|1|n", "C|1|n|x", "S|1|a|7", "F|1|a|7"}) {
+    ASSERT_GT(write(atrace_marker_fd, text, strlen(text)), 0);
   }
-  // Not recording: the marker descriptor is -1 and nothing is written.
-  ASSERT_EQ(atrace_marker_fd, -1);
-  SetTags(ATRACE_TAG_CAMERA);
-  ScopedTrace section("unrecorded");
-  SetTags(0);
-}
-
-TEST(HostTraceTest, PerfTraceLevelsGateSections) {
-  TraceRecording recording;
   {
     PerfTrace always(0, "always");
     PerfTrace detail(5, "detail at 0");
@@ -77,43 +54,58 @@ TEST(HostTraceTest, PerfTraceLevelsGateSections) {
   {
     PerfTrace::trace_level_ = 5;
     PerfTrace detail(5, "detail at 5");
-    // Lowering the level does not keep an engaged section open.
-    PerfTrace::trace_level_ = 0;
+    PerfTrace::trace_level_ = 0;  // still ends the section begun
   }
-  EXPECT_THAT(recording.Stop(),
-              ElementsAre("B always" + kMe, "E" + kMe, "B detail at 5" + kMe, "E" + kMe));
+  orvex_host_trace_flush();
+  EXPECT_THAT(
+      recording.Stop(),
+      ElementsAre("B outer \\\"quoted\\\"" + kMe, "B inner" + worker, "e capture #-7" + worker,
+                  "E" + worker, "C depth =-3" + kMe, "C bytes =1099511627776" + kMe, "E" + kMe,
+                  "b capture #8" + kMe, "e capture #8" + kMe, "B begun" + kMe, "C n =-5" + kMe,
+                  "b a #7" + kMe, "e a #7" + kMe, "B always" + kMe, "E" + kMe,
+                  "B detail at 5" + kMe, "E" + kMe));
+  std::ostringstream file;
+  file << std::ifstream(::testing::TempDir() + "trace_" + std::to_string(getpid()) + ".json")
+              .rdbuf();
+  EXPECT_THAT(file.str(), ::testing::HasSubstr("{\"name\":\"worker\"}"));  // thread names
 }
 
-// A failed write or close is reported by the stop call, whether the disk
-// fills part way (more events than the buffer holds) or at the end, and at
-// exit.
+TEST(HostTraceTest, CameraTagBitAndMarkerDescriptorGateEverything) {
+  // 0: all on; 1: camera tag off; 2: marker closed; 3: no tag named by the environment
+  for (int off = 0; off < 4; ++off) {
+    if (off == 3) setenv("ORVEX_TRACE_TAGS", "0", 1);
+    TraceRecording recording;
+    if (off == 1) atrace_enabled_tags = ~uint64_t{ATRACE_TAG_CAMERA};
+    const int marker_fd = atrace_marker_fd;
+    if (off == 2) atrace_marker_fd = -1;
+    {
+      ScopedTrace section("section");
+      ScopedTrace::TraceInt("counter", 1);
+      AsyncTraceBegin("async", 1);
+      AsyncTraceEnd("async", 1);
+    }
+    atrace_marker_fd = marker_fd;
+    EXPECT_EQ(recording.Stop().size(), off == 0 ? 5u : 0u) << off;
+    unsetenv("ORVEX_TRACE_TAGS");
+  }
+}
+
+// A failed write is reported by the stop call, whether the disk fills part
+// way (more events than the buffer holds) or, at exit, at the end.
 TEST(HostTraceDeathTest, StopReportsFailedWrites) {
-  for (int events : {1, 100}) {
-    SCOPED_TRACE(events);
-    ASSERT_EQ(orvex_host_trace_start("/dev/full"), 0);
-    for (int i = 0; i < events; ++i) ScopedTrace::TraceInt("counter", i);
-    EXPECT_EQ(orvex_host_trace_stop(), -1);
-    EXPECT_EQ(errno, ENOSPC);
-  }
-  EXPECT_EXIT(
-      {
-        orvex_host_trace_start("/dev/full");
-        exit(0);
-      },
-      ::testing::ExitedWithCode(0), "host trace: cannot write /dev/full: No space left on device");
+  ASSERT_EQ(orvex_host_trace_start("/dev/full"), 0);
+  for (int i = 0; i < 100; ++i) ScopedTrace::TraceInt("counter", i);
+  EXPECT_EQ(orvex_host_trace_stop(), -1);
+  EXPECT_EQ(errno, ENOSPC);
+  EXPECT_EXIT((orvex_host_trace_start("/dev/full"), exit(0)), ::testing::ExitedWithCode(0),
+              "host trace: cannot write /dev/full: No space left on device");
 }
 
-// libcutils, linked after the recorder, defines the same entry points as
-// no-ops: the tests above record all the same. Registered again with
-// libcutils preloaded ahead of the recorder, where recording is refused.
+// libcutils defines the same entry points as no-ops: linked after the recorder
+// it changes nothing; preloaded ahead of it (second registration), recording is refused.
 TEST(HostTraceTest, LibcutilsAlongside) {
   ASSERT_NE(dlopen("libcutils.so.0", RTLD_NOW | RTLD_NOLOAD), nullptr);
-  if (std::getenv("ORVEX_TEST_CUTILS_FIRST") == nullptr) {
-    TraceRecording recording;
-    { ScopedTrace section("beside libcutils"); }
-    EXPECT_THAT(recording.Stop(), ElementsAre("B beside libcutils" + kMe, "E" + kMe));
-    return;
-  }
+  if (std::getenv("ORVEX_TEST_CUTILS_FIRST") == nullptr) return;  // the tests above record
   const std::string path = ::testing::TempDir() + "refused.json";
   EXPECT_EQ(orvex_host_trace_start(path.c_str()), -1);
   EXPECT_EQ(errno, ENOTSUP);
