@@ -88,7 +88,6 @@ TEST(HalPixelFormatTest, PropertiesAndTexts) {
               F(row.uncompressed ? row.uncompressed : row.code));
     EXPECT_EQ(IsAfbcFormat(f), row.compression == BC::kAfbc);
   }
-  // Bit 16 alone makes a code AFBC.
   EXPECT_TRUE(IsAfbcFormat(F(0x10000)));
   EXPECT_FALSE(IsAfbcFormat(F(0x40000)));
   const char* const texts[] = {"Bggr", "Gbrg", "Grbg", "Rggb", "RGB", "Mono", "Nir", ""};

@@ -314,6 +314,8 @@ TEST(ImageFormatTest, Conformance) {
                   StatusIs(code, verbose ? message : ""));
     }
   }
+  // No luma and no compressed payload either: not YUV, whatever the subsampling says.
+  EXPECT_FALSE(Set(yuv, 0, &C::content, CC::kBayer).IsYuv(false).ok());
 }
 
 // Whether the rules of `target` look at `field` of a `content` component of
