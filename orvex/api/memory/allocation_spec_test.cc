@@ -71,8 +71,9 @@ TEST(AllocationSpecTest, DebugStrAndSize) {
 // during the flush is skipped, one that joins it is flushed from the next on.
 TEST(AllocatorTest, FlushReachesRegisteredAllocatorsOnce) {
   FakeAllocator root, a, b, added;
-  for (FakeAllocator* allocator : {&a, &b, static_cast<FakeAllocator*>(nullptr)})
+  for (FakeAllocator* allocator : {&a, &b, &added, static_cast<FakeAllocator*>(nullptr)})
     root.RegisterAllocator(allocator);
+  root.UnregisterAllocator(&added);
   root.Flush();
   EXPECT_EQ(a.flushes + b.flushes, 2);
   // Whichever is flushed first unregisters the other.

@@ -118,10 +118,11 @@ TEST(ImagePyramidTest, MakeFromSpansRefusals) {
   EXPECT_THAT(
       ImagePyramid::MakeFromSpans({0, 2}, {8, 8}, nullptr, 64, 10),
       StatusIs(StatusCode::kInvalidArgument, "parent buffer is null, unable to make ImagePyramid"));
-  // A parent fence of another kind is left alone.
+  // A parent without a software fence is left alone.
   std::shared_ptr<Buffer> parent = Heap(1024, std::make_unique<TwoStageSoftwareFence>());
   ASSERT_THAT(ImagePyramid::MakeFromSpans({0, 1}, {8, 8}, parent, 8, 8), IsOk());
   EXPECT_FALSE(IsDone(*parent));
+  EXPECT_THAT(ImagePyramid::MakeFromSpans({0, 1}, {8, 8}, Heap(1024), 8, 8), IsOk());
 }
 
 }  // namespace
