@@ -120,7 +120,7 @@ TEST(ImagePyramidTest, MakeFromSpansRefusals) {
       StatusIs(StatusCode::kInvalidArgument, "parent buffer is null, unable to make ImagePyramid"));
   // A parent without a software fence is left alone.
   std::shared_ptr<Buffer> parent = Heap(1024, std::make_unique<TwoStageSoftwareFence>());
-  ASSERT_THAT(ImagePyramid::MakeFromSpans({0, 1}, {8, 8}, parent, 8, 8), IsOk());
+  ASSERT_THAT(ImagePyramid::MakeFromSpans({1, 1}, {8, 8}, parent, 8, 8), IsOk());
   EXPECT_FALSE(IsDone(*parent));
   EXPECT_THAT(ImagePyramid::MakeFromSpans({0, 1}, {8, 8}, Heap(1024), 8, 8), IsOk());
 }

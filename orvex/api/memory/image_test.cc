@@ -138,6 +138,9 @@ TEST(MappedImageTest, MapsUsedBuffersAndFindsComponents) {
   EXPECT_THAT(Image::MappedImage::Make(image.get(), BufferAccessMode::kWrite),
               StatusIs(StatusCode::kUnimplemented));
   EXPECT_THAT(b0->unmaps(), ElementsAre(::testing::_, "0/2048/Write"));
+  // A format that uses buffer 0 alone.
+  image = Image::Make(ImageFormat::Make(8, 8, HalPixelFormat::BLOB).value(), {}, {b2}).value();
+  EXPECT_THAT(Image::MappedImage::Make(image.get(), BufferAccessMode::kRead), IsOk());
 }
 
 // Writes (kWrite) or checks (kRead) a pattern over every mapped byte of
