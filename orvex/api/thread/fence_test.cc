@@ -16,7 +16,6 @@
 #include "orvex/api/thread/fence_testing.h"
 #include "orvex/api/thread/merged_fence.h"
 #include "orvex/api/thread/two_stage_software_fence.h"
-#include "orvex/status/status_matchers.h"
 
 namespace orvex {
 namespace {
@@ -25,37 +24,19 @@ using ::orvex::testing::BlockedWaiter;
 using ::orvex::testing::Done;
 using ::orvex::testing::ExpectDonePromptly;
 using ::orvex::testing::NotDone;
-using ::orvex::testing::StatusIs;
 using ::testing::ElementsAre;
 
 const Status kE1 = DataLossError("e1");
 
-// Completes a software or two-stage fence with `status`.
-void Complete(Fence& fence, const Status& status) {
-  if (auto* software = dynamic_cast<SoftwareFence*>(&fence)) return software->Signal(status);
-  auto& two_stage = dynamic_cast<TwoStageSoftwareFence&>(fence);
-  ASSERT_TRUE(two_stage.SignalReadyToStart(OkStatus()).ok());
-  EXPECT_TRUE(two_stage.SignalDone(status).ok());
-}
-
-TEST(FenceTest, DummyAndBaseFences) {
-  std::unique_ptr<Fence> dummy = CreateFence(FenceType::kDummy);
-  dummy->Abort();
-  EXPECT_TRUE(Done(dummy->WaitForDone(absl::Milliseconds(-5))).ok());
-  Status heard = InternalError("not called at once");
-  ASSERT_TRUE(dummy->AddListener([&](Status s) { heard = s; }).ok());
-  EXPECT_TRUE(heard.ok());
-  EXPECT_THAT(testing::RecordingFence().AddListener([](Status) { ADD_FAILURE(); }),
-              StatusIs(StatusCode::kUnimplemented,
-                       "Fence::AddListener is unimplemented by design. Specific fence "
-                       "implementations must provide their own implementation of AddListener "
-                       "if needed."));
+TEST(FenceTest, BaseAddListenerRefuses) {
+  EXPECT_EQ(testing::RecordingFence().AddListener([](Status) { ADD_FAILURE(); }).ToString(),
+            "UNIMPLEMENTED: Fence::AddListener is unimplemented by design. Specific fence "
+            "implementations must provide their own implementation of AddListener if needed.");
 }
 
 TEST(SoftwareFenceTest, SignalsListenersAndReset) {
   SoftwareFence fence("frame");
-  EXPECT_THAT(fence.GetStatus(),
-              StatusIs(StatusCode::kUnavailable, "Fence not yet (fully) signalled."));
+  EXPECT_EQ(fence.GetStatus().ToString(), "UNAVAILABLE: Fence not yet (fully) signalled.");
   EXPECT_TRUE(NotDone(fence.WaitForDone(absl::Milliseconds(2))));
   std::vector<std::string> calls;
   const auto record = [&](Status s) { calls.push_back(s.ToString()); };
@@ -77,21 +58,20 @@ TEST(SoftwareFenceTest, SignalsListenersAndReset) {
   EXPECT_EQ(fence.name(), "third");
 }
 
-// Waits that begin after the signal return at once: a listener's own, and
-// another thread's while a listener still runs. A waiter blocked before the
-// signal wakes after every listener, also when some throw: the signaller
-// then gets the first exception.
+// Waits begun after the signal return at once; blocked ones wake after all
+// listeners, also when some throw (the signaller gets the first exception).
 TEST(FenceKindsTest, WaitsBegunAfterTheSignalReturnAtOnce) {
   for (FenceType type : {FenceType::kSoftware, FenceType::kTwoStageSoftware}) {
     SCOPED_TRACE(static_cast<int>(type));
     std::unique_ptr<Fence> fence = CreateFence(type);
+    auto* software = dynamic_cast<SoftwareFence*>(fence.get());
     auto* two_stage = dynamic_cast<TwoStageSoftwareFence*>(fence.get());
+    ASSERT_TRUE(software != nullptr || two_stage->SignalReadyToStart(OkStatus()).ok());
     std::atomic<bool> in_listener{false}, release{false}, listener_done{false};
     const auto listener = [&](Status) {
       EXPECT_EQ(Done(fence->WaitForDone(absl::InfiniteDuration())), kE1);
       ExpectDonePromptly(*fence, kE1);
-      EXPECT_TRUE(two_stage == nullptr ||
-                  two_stage->WaitUntilReadyToStart(absl::InfiniteDuration()).ok());
+      EXPECT_TRUE(software || two_stage->WaitUntilReadyToStart(absl::InfiniteDuration()).ok());
       in_listener = true;
       while (!release) std::this_thread::yield();
       listener_done = true;
@@ -103,7 +83,10 @@ TEST(FenceKindsTest, WaitsBegunAfterTheSignalReturnAtOnce) {
       EXPECT_EQ(Done(fence->WaitForDone(absl::Seconds(30))), kE1);
       EXPECT_TRUE(listener_done);
     });
-    std::thread signaller([&] { EXPECT_THROW(Complete(*fence, kE1), std::runtime_error); });
+    std::thread signaller([&] {
+      EXPECT_THROW(software ? software->Signal(kE1) : (void)two_stage->SignalDone(kE1),
+                   std::runtime_error);
+    });
     while (!in_listener) std::this_thread::yield();
     ExpectDonePromptly(*fence, kE1);
     release = true;
@@ -180,8 +163,6 @@ TEST(SoftwareFenceStressTest, ListenersRunOnceAndWaitsEnd) {
                              std::thread([&] { fence.Abort(); })};
     for (std::thread& t : threads) t.join();
     ASSERT_EQ(calls.load(), 7);
-    const Status s = fence.GetStatus();
-    EXPECT_TRUE(s.ok() || IsAborted(s)) << s;
   }
 }
 

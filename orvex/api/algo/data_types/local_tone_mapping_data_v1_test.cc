@@ -2,8 +2,6 @@
 
 #include <cmath>
 #include <functional>
-#include <limits>
-#include <random>
 #include <string>
 #include <vector>
 
@@ -15,14 +13,9 @@
 namespace orvex {
 namespace {
 
-using ::orvex::testing::IsOk;
 using ::orvex::testing::StatusIs;
 using ::testing::Each;
-using ::testing::ElementsAre;
-using ::testing::FloatEq;
 using ::testing::FloatNear;
-using ::testing::IsEmpty;
-using ::testing::Pointwise;
 using Data = LocalToneMappingDataV1;
 
 constexpr float kSentinel = -7.0f;
@@ -42,14 +35,13 @@ void FillGrid(Data& data, const std::function<float(int, int, int, int)>& value)
 }
 
 void FillCurve(Data& data, const std::function<float(int)>& value) {
-  auto* p = static_cast<float*>(data.guide_curve->GetPointer());
-  for (int i = 0; i < data.guide_curve->desc.num_entries; ++i) p[i] = value(i);
+  for (int i = 0; i < 128; ++i) static_cast<float*>(data.guide_curve->GetPointer())[i] = value(i);
 }
 
 // The gains of entries 1 to n - 1 of an n-entry table; entry 0 must be 1.
 std::vector<float> Gains(const Data& data, int n) {
   std::vector<float> lut(static_cast<size_t>(n) + 1, kSentinel);
-  EXPECT_THAT(data.GetGlobalToneMap(n, lut.data()), IsOk());
+  EXPECT_TRUE(data.GetGlobalToneMap(n, lut.data()).ok());
   EXPECT_EQ(lut.front(), 1.0f);
   EXPECT_EQ(lut.back(), kSentinel) << "wrote past the table";
   return std::vector<float>(lut.begin() + 1, lut.end() - 1);
@@ -57,27 +49,22 @@ std::vector<float> Gains(const Data& data, int n) {
 
 // A caller's own storage of `n` elements; none gives a null pointer.
 template <typename Base, typename Element>
-class CallerStorage : public Base {
- public:
-  explicit CallerStorage(size_t n) : data_(n) {}
-  void* GetPointer() override { return data_.empty() ? nullptr : data_.data(); }
-  const void* GetPointer() const override { return data_.empty() ? nullptr : data_.data(); }
-
- private:
-  std::vector<Element> data_;
+struct CallerStorage : Base {
+  explicit CallerStorage(size_t n) : data(n) {}
+  void* GetPointer() override { return data.empty() ? nullptr : data.data(); }
+  const void* GetPointer() const override { return data.empty() ? nullptr : data.data(); }
+  std::vector<Element> data;
 };
 using CallerGrid = CallerStorage<Data::Grid, uint16_t>;
 using CallerCurve = CallerStorage<Data::GuideCurve, float>;
 
 TEST(HalfConversionTest, KnownValuesRoundingAndRoundTrips) {
-  const float inf = std::numeric_limits<float>::infinity();
   // clang-format off
   const struct { float value; uint16_t half; bool exact; } cases[] = {
-      {-2.0f, 0xC000, true}, {0.333251953125f, 0x3555, true}, {65504.0f, 0x7BFF, true},
-      {0x1p-24f, 0x0001, true}, {0x1p-14f, 0x0400, true}, {inf, 0x7C00, true},
-      {1.0f + 0x1p-11f, 0x3C00, false}, {1.0f + 3 * 0x1p-11f, 0x3C02, false},  // ties to even
-      {0x1p-25f, 0x0000, false}, {3 * 0x1p-25f, 0x0002, false}, {65519.0f, 0x7BFF, false},
-      {65520.0f, 0x7C00, false}, {-1e9f, 0xFC00, false}};
+      {-2.0f, 0xC000, true}, {0.333251953125f, 0x3555, true}, {0x1p-24f, 1, true},
+      {INFINITY, 0x7C00, true}, {65519.0f, 0x7BFF, false}, {65520.0f, 0x7C00, false},
+      {-1e9f, 0xFC00, false}, {1 + 0x1p-11f, 0x3C00, false}, {1 + 3 * 0x1p-11f, 0x3C02, false},
+      {0x1p-25f, 0, false}, {3 * 0x1p-25f, 2, false}};  // the last four: ties to even
   // clang-format on
   for (const auto& c : cases) {
     SCOPED_TRACE(c.value);
@@ -92,10 +79,9 @@ TEST(HalfConversionTest, KnownValuesRoundingAndRoundTrips) {
   }
 }
 
-TEST(LocalToneMappingTest, GuideCurveSelectsAndClampsBins) {
+TEST(LocalToneMappingTest, GainsFollowTheGridAndTheGuideCurve) {
   auto data = MakeData();
-  data->SetIdentity();
-  EXPECT_THAT(Gains(*data, 1), IsEmpty());
+  EXPECT_TRUE(Gains(*data, 1).empty());
   // Bin z has slope z + 1, but for one cell that the average must dilute.
   FillGrid(*data, [](int x, int y, int z, int c) {
     return c == 1 ? 0.0f : static_cast<float>(z + 1) + (x == 3 && y == 4 ? 192.0f : 0.0f);
@@ -104,14 +90,13 @@ TEST(LocalToneMappingTest, GuideCurveSelectsAndClampsBins) {
   for (const auto& c : cases) {
     SCOPED_TRACE(c.first);
     FillCurve(*data, [&](int) { return c.first; });
-    EXPECT_THAT(Gains(*data, 17), Each(FloatEq(c.second)));
+    EXPECT_THAT(Gains(*data, 17), Each(::testing::FloatEq(c.second)));
   }
   // A rising guide curve: the gain at t interpolates the bins around 7 * t.
   FillCurve(*data, [](int i) { return static_cast<float>(i) / 127.0f; });
   EXPECT_THAT(Gains(*data, 8),
-              Pointwise(FloatNear(1e-4f), std::vector<float>{3, 4, 5, 6, 7, 8, 9}));
-  // Zero strides share elements: one per row for slope and bias (gains
-  // 1 + 0.5 / t), or one for everything (0.5 + 0.5 / t).
+              ::testing::Pointwise(FloatNear(1e-4f), std::vector<float>{3, 4, 5, 6, 7, 8, 9}));
+  // Zero strides share elements: one slope and bias per row, or one for all.
   const std::pair<Data::GridDesc, std::vector<float>> shared[] = {
       {{16, 12, 8, 2, 0, 32, 0, 1, 2}, {2.0f, 1.5f}},
       {{16, 12, 8, 2, 0, 0, 0, 0, 2}, {1.5f, 1.0f}}};
@@ -120,19 +105,24 @@ TEST(LocalToneMappingTest, GuideCurveSelectsAndClampsBins) {
     FillGrid(*data, [](int, int, int, int c) { return c == 0 ? 1.0f : 0.5f; });
     EXPECT_EQ(Gains(*data, 3), gains);
   }
+  // All-zero grids are raised to rise by 1e-6 per entry, and so is a falling one.
+  FillGrid(*data, [](int, int, int, int) { return 0.0f; });
+  for (int n : {2, 257}) {
+    SCOPED_TRACE(n);
+    EXPECT_THAT(Gains(*data, n), Each(FloatNear((n - 1) * 1e-6f, (n - 1) * 1e-9f)));
+  }
+  data->grid->desc = Data::GridDesc();
+  FillGrid(*data, [](int, int, int z, int c) { return c == 0 ? (z < 4 ? 1.0f : 0.25f) : 0.0f; });
+  const auto g = Gains(*data, 257);  // 256 t gain rises by 256e-6 per entry
+  for (size_t k = 1; k < g.size(); ++k)
+    EXPECT_GE((k + 1) * double{g[k]} - k * double{g[k - 1]}, 0.9e-6 * 256) << k;
 }
 
-// The packed layout takes the vector kernel (once per target), the others
-// the scalar loop: planar, and caller grids with padded rows or with bins
-// that keep slopes and biases apart. All give the identity and one curve.
+// Packed (vector sums), planar and caller-owned padded layouts: one curve.
 class LocalToneMappingVectorTest : public VectorTargetTest {};
 ORVEX_INSTANTIATE_FOR_VECTOR_TARGETS(LocalToneMappingVectorTest);
 
 TEST_P(LocalToneMappingVectorTest, LayoutsGiveTheSameCurve) {
-  std::mt19937 rng(11);
-  std::uniform_real_distribution<float> slope(0.25f, 3.0f), bias(-0.2f, 0.2f);
-  std::vector<float> values(16 * 12 * 8 * 2);
-  for (size_t i = 0; i < values.size(); ++i) values[i] = (i % 2 == 0) ? slope(rng) : bias(rng);
   // clang-format off
   const struct { int32_t x, y, z, channel; bool caller; } layouts[] = {
       {2, 32, 384, 1, false}, {1, 16, 192, 1536, false}, {2, 64, 768, 1, true},
@@ -146,8 +136,10 @@ TEST_P(LocalToneMappingVectorTest, LayoutsGiveTheSameCurve) {
     data->grid->desc = {16, 12, 8, 2, l.x, l.y, l.z, l.channel, 2};
     data->SetIdentity();
     EXPECT_THAT(Gains(*data, 257), Each(1.0f));
-    FillGrid(*data,
-             [&](int x, int y, int z, int c) { return values[(((z * 12) + y) * 16 + x) * 2 + c]; });
+    FillGrid(*data, [](int x, int y, int z, int c) {
+      return c == 0 ? 0.25f * ((x * 7 + y * 5 + z * 3) % 11 + 1)
+                    : 0.05f * ((x + 3 * y + 5 * z) % 9 - 4);
+    });
     FillCurve(*data, [](int i) { return std::sqrt(static_cast<float>(i) / 127.0f); });
     const auto gains = Gains(*data, 257);
     if (reference.empty()) reference = gains;
@@ -156,24 +148,7 @@ TEST_P(LocalToneMappingVectorTest, LayoutsGiveTheSameCurve) {
   }
 }
 
-TEST(LocalToneMappingTest, FallingCurvesAreRaised) {
-  auto data = MakeData();
-  FillGrid(*data, [](int, int, int, int) { return 0.0f; });
-  FillCurve(*data, [](int) { return 0.5f; });
-  for (int n : {2, 257}) {
-    SCOPED_TRACE(n);
-    EXPECT_THAT(Gains(*data, n), Each(FloatNear((n - 1) * 1e-6f, (n - 1) * 1e-9f)));
-  }
-  // A curve that falls halfway: 256 t gain still rises by 256e-6 per entry.
-  FillGrid(*data, [](int, int, int z, int c) { return c == 0 ? (z < 4 ? 1.0f : 0.25f) : 0.0f; });
-  FillCurve(*data, [](int i) { return static_cast<float>(i) / 127.0f; });
-  const auto g = Gains(*data, 257);
-  for (size_t k = 1; k < g.size(); ++k)
-    EXPECT_GE((k + 1) * double{g[k]} - k * double{g[k - 1]}, 0.9e-6 * 256) << k;
-}
-
-// Descriptions that GetGlobalToneMap refuses without writing, and that end
-// the process in SetIdentity, which writes through them.
+// GetGlobalToneMap refuses these without writing; SetIdentity dies on most.
 TEST(LocalToneMappingDeathTest, UnsoundDescriptions) {
   const std::string outside = "Grid strides address elements outside the grid buffer";
   const char* layout = "Check failed: GridLayoutFits\\(\\*grid\\) grid layout does not fit";
@@ -203,7 +178,6 @@ TEST(LocalToneMappingDeathTest, UnsoundDescriptions) {
        "Guide curve entries outside the guide curve buffer",
        "Check failed: GuideCurveFits\\(\\*guide_curve\\) guide curve entries do not fit"},
       {[](Data& d) { d.grid->desc.stride_z = 385; }, outside, layout},  // outruns the heap storage
-      {[](Data& d) { d.grid->desc.width = 17; }, outside, layout},
       {[](Data& d) { d.grid->desc.stride_x = -2; }, outside, layout},
       {[](Data& d) { d.grid->desc.stride_channel = -1; }, outside, layout},
   };
