@@ -66,7 +66,6 @@ TEST(MergedFenceTest, EachFenceGetsOneWaitWithItsShareOfTheTimeout) {
   TwoStageSoftwareFence two_stage_done, two_stage_pending;
   done.Signal(OkStatus());
   ASSERT_TRUE(two_stage_done.SignalDone(kE1).ok());
-  // `second`, if reached, gets a timeout in [second_min, second_max].
   const FenceWaitResult ok = OkStatus(), not_done = orvex_api::FenceNotDone{};
   // clang-format off
   const struct {
