@@ -58,8 +58,7 @@ TEST(SoftwareFenceTest, SignalsListenersAndReset) {
   EXPECT_EQ(fence.name(), "third");
 }
 
-// Waits begun after the signal return at once; blocked ones, even woken early by a
-// second signal, wait for all listeners, also ones that throw (first one rethrown).
+// Late waits return at once; blocked ones wait for every listener, throwing or signalling.
 TEST(FenceKindsTest, WaitsBegunAfterTheSignalReturnAtOnce) {
   for (FenceType type : {FenceType::kSoftware, FenceType::kTwoStageSoftware}) {
     SCOPED_TRACE(static_cast<int>(type));
