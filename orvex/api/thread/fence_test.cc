@@ -37,7 +37,6 @@ TEST(FenceTest, BaseAddListenerRefuses) {
 TEST(SoftwareFenceTest, SignalsListenersAndReset) {
   SoftwareFence fence("frame");
   EXPECT_EQ(fence.GetStatus().ToString(), "UNAVAILABLE: Fence not yet (fully) signalled.");
-  EXPECT_TRUE(NotDone(fence.WaitForDone(absl::Milliseconds(2))));
   std::vector<std::string> calls;
   const auto record = [&](Status s) { calls.push_back(s.ToString()); };
   ASSERT_TRUE(fence.AddListener(record).ok());
@@ -55,10 +54,9 @@ TEST(SoftwareFenceTest, SignalsListenersAndReset) {
   ASSERT_TRUE(fence.AddListener([token](Status) { ADD_FAILURE(); }).ok());
   fence.Reset("third");  // drops the listener uncalled
   EXPECT_EQ(token.use_count(), 1);
-  EXPECT_EQ(fence.name(), "third");
 }
 
-// Late waits return at once; blocked ones wait for every listener, throwing or signalling.
+// Late waits return at once; blocked ones wait for all listeners or see the status at timeout.
 TEST(FenceKindsTest, WaitsBegunAfterTheSignalReturnAtOnce) {
   for (FenceType type : {FenceType::kSoftware, FenceType::kTwoStageSoftware}) {
     SCOPED_TRACE(static_cast<int>(type));
@@ -66,7 +64,7 @@ TEST(FenceKindsTest, WaitsBegunAfterTheSignalReturnAtOnce) {
     auto* software = dynamic_cast<SoftwareFence*>(fence.get());
     auto* two_stage = dynamic_cast<TwoStageSoftwareFence*>(fence.get());
     ASSERT_TRUE(software != nullptr || two_stage->SignalReadyToStart(OkStatus()).ok());
-    std::atomic<bool> in_listener{false}, release{false}, listener_done{false};
+    std::atomic<bool> in_listener{false}, release{false}, listener_done{false}, timed_out{false};
     const auto listener = [&](Status) {
       EXPECT_EQ(Done(fence->WaitForDone(absl::InfiniteDuration())), kE1);
       ExpectDonePromptly(*fence, kE1);
@@ -83,12 +81,17 @@ TEST(FenceKindsTest, WaitsBegunAfterTheSignalReturnAtOnce) {
       EXPECT_EQ(Done(fence->WaitForDone(absl::Seconds(30))), kE2);
       EXPECT_TRUE(listener_done);
     });
+    BlockedWaiter timed([&] {  // its deadline passes while a listener runs
+      EXPECT_EQ(Done(fence->WaitForDone(absl::Milliseconds(500))), kE1);
+      timed_out = true;
+    });
     std::thread signaller([&] {
       EXPECT_THROW(software ? software->Signal(kE1) : (void)two_stage->SignalDone(kE1),
                    std::runtime_error);
     });
     while (!in_listener) std::this_thread::yield();
     ExpectDonePromptly(*fence, kE1);
+    while (!timed_out) std::this_thread::yield();
     release = true;
     signaller.join();
   }

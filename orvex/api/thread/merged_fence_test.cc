@@ -24,8 +24,7 @@ using ::orvex::testing::RecordingFence;
 using ::orvex::testing::StatusIs;
 using ::testing::ElementsAre;
 
-const Status kE1 = DataLossError("e1");
-const Status kE2 = CancelledError("e2");
+const Status kE1 = DataLossError("e1"), kE2 = CancelledError("e2");
 
 // A listener that records the status of each call in `calls`.
 FenceListener Recorder(std::vector<std::string>& calls) {

@@ -20,8 +20,7 @@ using ::orvex::testing::Done;
 using ::orvex::testing::NotDone;
 using ::testing::ElementsAre;
 
-const Status kE1 = DataLossError("e1");
-const Status kE2 = CancelledError("e2");
+const Status kE1 = DataLossError("e1"), kE2 = CancelledError("e2");
 const Status kGaveUp = DeadlineExceededError("gave up");
 
 // "r"/"d" signal ready/done with OK ("+"), kE1 or kE2; "a" aborts; "f" forfeits.
