@@ -1,12 +1,10 @@
 #include "orvex/api/thread/two_stage_software_fence.h"
 
 #include <atomic>
-#include <chrono>
-#include <functional>
 #include <iterator>
 #include <string>
 #include <thread>
-#include <variant>
+#include <utility>
 #include <vector>
 
 #include "absl/time/clock.h"
@@ -14,158 +12,107 @@
 #include "gmock/gmock.h"
 #include "gtest/gtest.h"
 #include "orvex/api/thread/fence_testing.h"
-#include "orvex/status/status_matchers.h"
 
 namespace orvex {
 namespace {
 
+using ::orvex::testing::Done;
 using ::orvex::testing::NotDone;
-using ::orvex::testing::StatusIs;
 using ::testing::ElementsAre;
-using ::testing::HasSubstr;
 
-const Status kE1 = DataLossError("e1");
-const Status kE2 = CancelledError("e2");
-constexpr char kReadyAgainOk[] =
-    "Two stage fence signaled ready-to-start is already signaled with OkStatus, it cannot be "
-    "signaled again with OkStatus.";
+const Status kE1 = DataLossError("e1"), kE2 = CancelledError("e2");
+const Status kGaveUp = DeadlineExceededError("gave up");
 
-// Each state is reached from the initial one by a sequence of operations.
-using Op = std::function<Status(TwoStageSoftwareFence&)>;
-Op Ready(Status s) {
-  return [s](auto& f) { return f.SignalReadyToStart(s); };
+// "r"/"d" signal ready/done with OK ("+"), kE1 or kE2; "a" aborts; "f" forfeits.
+Status Apply(TwoStageSoftwareFence& fence, const std::string& op) {
+  if (op == "a") return fence.Abort(), OkStatus();
+  if (op == "f") return fence.WaitUntilReadyToStartOrForfeit(absl::ZeroDuration(), kGaveUp);
+  const Status s = op[1] == '+' ? OkStatus() : op[1] == '1' ? kE1 : kE2;
+  return op[0] == 'r' ? fence.SignalReadyToStart(s) : fence.SignalDone(s);
 }
-Op Done(Status s) {
-  return [s](auto& f) { return f.SignalDone(s); };
-}
-const Op kReadyOk = Ready(OkStatus()), kReadyE1 = Ready(kE1), kReadyE2 = Ready(kE2);
-const Op kDoneOk = Done(OkStatus()), kDoneE1 = Done(kE1), kDoneE2 = Done(kE2);
-const Op kAbort = [](auto& f) { return f.Abort(), OkStatus(); };
 
-// "OK"/status text, or "-" for a stage not yet over.
-std::string ReadyText(const TwoStageSoftwareFence& fence) {
-  Status s = fence.GetReadyToStartStatus();
-  return IsUnavailable(s) ? "-" : s.ToString();
-}
-std::string DoneText(const TwoStageSoftwareFence& fence) {
-  FenceWaitResult r = fence.WaitForDone(absl::ZeroDuration());
-  return std::holds_alternative<Status>(r) ? std::get<Status>(r).ToString() : "-";
+// The statuses of both stages, "-" for one not yet over.
+std::pair<std::string, std::string> Stages(const TwoStageSoftwareFence& fence) {
+  const Status ready = fence.GetReadyToStartStatus();
+  const FenceWaitResult done = fence.WaitForDone(absl::ZeroDuration());
+  return {IsUnavailable(ready) ? "-" : ready.ToString(),
+          NotDone(done) ? "-" : Done(done).ToString()};
 }
 
 TEST(TwoStageSoftwareFenceTest, EveryTransition) {
-  const std::string ok = "OK", e1 = kE1.ToString(), e2 = kE2.ToString();
-  const std::string aborted = "ABORTED: Fence was aborted";
-  const std::string done_twice =
-      "FAILED_PRECONDITION: Two stage fence signaled done twice, and one of the statuses was not "
-      "an error: Old status = ";
-  const std::vector<Op> initial, ready = {kReadyOk}, done_ok = {kReadyOk, kDoneOk},
-                                 failed = {kReadyE1}, done_after_ok_start = {kReadyOk, kDoneE1};
-  struct Case {
-    std::vector<Op> state;
-    Op op;
-    std::string result, ready, done;
+  const std::string ok = "OK", e1 = kE1.ToString(), e2 = kE2.ToString(), g = kGaveUp.ToString();
+  const std::string aborted = "ABORTED: Fence was aborted", pre = "FAILED_PRECONDITION: ";
+  const std::string twice = pre +
+                            "Two stage fence signaled done twice, and one of the statuses was not "
+                            "an error: Old status = ";
+  const std::string ready_again = pre +
+                                  "Two stage fence signaled ready-to-start is already signaled "
+                                  "with OkStatus, it cannot be signaled again with OkStatus.";
+  const std::string not_after_error =
+      pre + "Two stage fence signaled ready-to-start is already signaled with " + e1 +
+      " Cannot change to OkStatus since error already happened.";
+  const std::string never_ready =
+      pre + "Two stage fence done signaled ok, but ready-to-start signal was never received";
+  const std::string timed_out =
+      "DEADLINE_EXCEEDED: timed out waiting for two stage software fence ready-to-start signal "
+      "with a timeout duration of: 0";
+  const std::string forfeited =
+      "INTERNAL: Ready-to-start fence is with timeout status (" + g +
+      "), meaning that the consumer already timeout and gave up the frame";
+  // clang-format off
+  const struct {
+    std::vector<std::string> state;
+    std::string op, result, ready, done;
+  } cases[] = {
+      {{}, "r+", ok, ok, "-"}, {{}, "r2", ok, e2, e2}, {{}, "d+", never_ready, "-", "-"},
+      {{}, "d2", ok, e2, e2}, {{}, "f", timed_out, g, g},
+      {{"r+"}, "r+", ready_again, ok, "-"}, {{"r+"}, "r2", ok, e2, e2},
+      {{"r+"}, "d+", ok, ok, ok}, {{"r+"}, "d2", ok, ok, e2}, {{"r+"}, "f", ok, ok, "-"},
+      {{"r+", "d+"}, "r2", ok, e2, ok}, {{"r+", "d+"}, "a", ok, aborted, aborted},
+      {{"r+", "d+"}, "d+", twice + "OK New status = OK", ok, ok},
+      {{"r+", "d+"}, "d2", twice + "OK New status = " + e2, ok, ok},
+      {{"r1"}, "r+", not_after_error, e1, e1}, {{"r1"}, "r2", ok, e1, e1},
+      {{"r1"}, "d+", twice + e1 + " New status = OK", e1, e1}, {{"r1"}, "d2", ok, e1, e2},
+      {{"f"}, "f", forfeited, g, g}, {{"f"}, "d+", twice + g + " New status = OK", g, g},
   };
-  const Case cases[] = {
-      {initial, kReadyOk, ok, ok, "-"},
-      {initial, kReadyE2, ok, e2, e2},
-      {initial, kDoneOk,
-       "FAILED_PRECONDITION: Two stage fence done signaled ok, but ready-to-start signal was "
-       "never received",
-       "-", "-"},
-      {initial, kDoneE2, ok, e2, e2},
-      {ready, kReadyOk, "FAILED_PRECONDITION: " + std::string(kReadyAgainOk), ok, "-"},
-      {ready, kReadyE2, ok, e2, e2},
-      {ready, kDoneOk, ok, ok, ok},
-      {ready, kDoneE2, ok, ok, e2},
-      {done_ok, kReadyOk, "FAILED_PRECONDITION: " + std::string(kReadyAgainOk), ok, ok},
-      {done_ok, kReadyE2, ok, e2, ok},
-      {done_ok, kDoneOk, done_twice + "OK New status = OK", ok, ok},
-      {done_ok, kDoneE2, done_twice + "OK New status = " + e2, ok, ok},
-      {done_ok, kAbort, ok, aborted, aborted},
-      {failed, kReadyOk,
-       "FAILED_PRECONDITION: Two stage fence signaled ready-to-start is already signaled with " +
-           e1 + " Cannot change to OkStatus since error already happened.",
-       e1, e1},
-      {failed, kReadyE2, ok, e1, e1},
-      {failed, kDoneOk, done_twice + e1 + " New status = OK", e1, e1},
-      {failed, kDoneE2, ok, e1, e2},
-      {failed, kAbort, ok, aborted, aborted},
-      {done_after_ok_start, kReadyOk, "FAILED_PRECONDITION: " + std::string(kReadyAgainOk), ok, e1},
-      {done_after_ok_start, kReadyE2, ok, e2, e1},
-      {done_after_ok_start, kDoneOk, done_twice + e1 + " New status = OK", ok, e1},
-      {done_after_ok_start, kDoneE2, ok, ok, e2},
-  };
+  // clang-format on
   for (size_t i = 0; i < std::size(cases); ++i) {
-    const Case& c = cases[i];
     SCOPED_TRACE(i);
     TwoStageSoftwareFence fence;
-    for (const Op& op : c.state) ASSERT_TRUE(op(fence).ok());
-    EXPECT_EQ(c.op(fence).ToString(), c.result);
-    EXPECT_EQ(ReadyText(fence), c.ready);
-    EXPECT_EQ(DoneText(fence), c.done);
+    for (const std::string& op : cases[i].state) (void)Apply(fence, op);
+    EXPECT_EQ(Apply(fence, cases[i].op).ToString(), cases[i].result);
+    EXPECT_EQ(Stages(fence), std::pair(cases[i].ready, cases[i].done));
   }
 }
 
 TEST(TwoStageSoftwareFenceTest, ListenersRunOnlyInSignalDone) {
   TwoStageSoftwareFence fence;
   std::vector<std::string> calls;
-  ASSERT_TRUE(fence.AddListener([&](Status s) { calls.push_back("a " + s.ToString()); }).ok());
-  ASSERT_TRUE(fence.AddListener([&](Status s) { calls.push_back("b " + s.ToString()); }).ok());
+  const auto record = [&](Status s) { calls.push_back(s.ToString()); };
+  ASSERT_TRUE(fence.AddListener(record).ok());
   ASSERT_TRUE(fence.SignalReadyToStart(kE1).ok());
   fence.Abort();
-  EXPECT_TRUE(calls.empty());  // failed without SignalDone: nobody called
-  ASSERT_TRUE(fence.AddListener([&](Status s) { calls.push_back("c " + s.ToString()); }).ok());
+  ASSERT_TRUE(fence.AddListener(record).ok());  // done: called at once
   ASSERT_TRUE(fence.SignalDone(kE2).ok());
-  ASSERT_TRUE(fence.AddListener([&](Status s) { calls.push_back("d " + s.ToString()); }).ok());
-  EXPECT_THAT(calls, ElementsAre("c ABORTED: Fence was aborted", "a " + kE2.ToString(),
-                                 "b " + kE2.ToString(), "d " + kE2.ToString()));
+  EXPECT_THAT(calls, ElementsAre("ABORTED: Fence was aborted", kE2.ToString()));
 }
 
-TEST(TwoStageSoftwareFenceTest, WaitsTimeOutWakeAndForfeit) {
+TEST(TwoStageSoftwareFenceTest, WaitsTimeOutOrWake) {
   TwoStageSoftwareFence fence;
-  EXPECT_THAT(fence.GetReadyToStartStatus(),
-              StatusIs(StatusCode::kUnavailable,
-                       "Two stage fence has not been signaled ready-to-start yet"));
-  EXPECT_THAT(fence.WaitUntilReadyToStart(absl::Milliseconds(2)),
-              StatusIs(StatusCode::kDeadlineExceeded,
-                       "timed out waiting for two stage software fence ready-to-start signal "
-                       "with a timeout duration of: 2ms"));
-  EXPECT_THAT(fence.WaitUntilReadyToStart(absl::ZeroDuration()),
-              StatusIs(StatusCode::kDeadlineExceeded));
+  EXPECT_EQ(fence.GetReadyToStartStatus().ToString(),
+            "UNAVAILABLE: Two stage fence has not been signaled ready-to-start yet");
+  EXPECT_EQ(fence.WaitUntilReadyToStart(absl::Milliseconds(2)).ToString(),
+            "DEADLINE_EXCEEDED: timed out waiting for two stage software fence ready-to-start "
+            "signal with a timeout duration of: 2ms");
   EXPECT_TRUE(NotDone(fence.WaitForDone(absl::Microseconds(100))));
-  std::thread producer([&] {
-    std::this_thread::sleep_for(std::chrono::milliseconds(5));
-    EXPECT_TRUE(fence.SignalReadyToStart(OkStatus()).ok());
-    std::this_thread::sleep_for(std::chrono::milliseconds(5));
-    EXPECT_TRUE(fence.SignalDone(kE1).ok());
-  });
-  EXPECT_TRUE(fence.WaitUntilReadyToStart(absl::InfiniteDuration()).ok());
-  EXPECT_EQ(std::get<Status>(fence.WaitForDone(absl::Seconds(30))), kE1);
-  producer.join();
-  // Ready in time: no forfeit.
-  EXPECT_TRUE(fence.WaitUntilReadyToStartOrForfeit(absl::ZeroDuration(), kE2).ok());
-  EXPECT_EQ(std::get<Status>(fence.WaitForDone(absl::ZeroDuration())), kE1);
-
-  // A consumer that forfeits after its timeout; a second one finds that.
-  TwoStageSoftwareFence late;
-  const Status forfeit = DeadlineExceededError("consumer gave up");
-  EXPECT_THAT(late.WaitUntilReadyToStartOrForfeit(absl::Milliseconds(1), forfeit),
-              StatusIs(StatusCode::kDeadlineExceeded,
-                       HasSubstr("ready-to-start signal with a timeout duration of: 1ms")));
-  EXPECT_EQ(std::get<Status>(late.WaitForDone(absl::ZeroDuration())), forfeit);
-  EXPECT_EQ(late.GetReadyToStartStatus(), forfeit);
-  EXPECT_THAT(late.SignalDone(OkStatus()),
-              StatusIs(StatusCode::kFailedPrecondition, HasSubstr("signaled done twice")));
-  EXPECT_THAT(
-      late.WaitUntilReadyToStartOrForfeit(absl::Milliseconds(1), kE2),
-      StatusIs(StatusCode::kInternal,
-               "Ready-to-start fence is with timeout status (DEADLINE_EXCEEDED: consumer "
-               "gave up), meaning that the consumer already timeout and gave up the frame"));
+  testing::BlockedWaiter waiter(
+      [&] { EXPECT_TRUE(fence.WaitUntilReadyToStart(absl::InfiniteDuration()).ok()); });
+  EXPECT_TRUE(fence.SignalReadyToStart(OkStatus()).ok());
 }
 
 TEST(TwoStageSoftwareFenceDeathTest, ContractViolations) {
-  TwoStageSoftwareFence fence;
-  EXPECT_DEATH((void)fence.WaitUntilReadyToStartOrForfeit(absl::Milliseconds(1), OkStatus()),
+  EXPECT_DEATH((void)TwoStageSoftwareFence().WaitUntilReadyToStartOrForfeit(absl::Milliseconds(1),
+                                                                            OkStatus()),
                "Check failed: forfeit_status != OkStatus\\(\\) \\(forfeit_status=OK, "
                "OkStatus\\(\\)=OK\\) Cannot forfeit with Ok status, even to confuse the enemy\\.");
   EXPECT_DEATH(
@@ -177,45 +124,30 @@ TEST(TwoStageSoftwareFenceDeathTest, ContractViolations) {
       "TwoStageSoftwareFence destroyed by one of its own listeners while being signalled");
 }
 
-// A producer racing a consumer that forfeits: exactly one of them wins the
-// ready-to-start stage, and every listener runs exactly once.
+// A forfeit racing the producer: one wins ready-to-start; listeners run once.
 TEST(TwoStageSoftwareFenceStressTest, ForfeitRacesLateProducer) {
   const absl::Time end = absl::Now() + absl::Seconds(2);
   for (int rounds = 0; rounds < 3000 && absl::Now() < end; ++rounds) {
     TwoStageSoftwareFence fence;
     std::atomic<int> calls{0};
-    std::vector<Status> seen(4);
-    const auto listen = [&](int i) {
-      return fence.AddListener([&seen, &calls, i](Status s) { seen[i] = s, ++calls; }).ok();
-    };
-    ASSERT_TRUE(listen(0) && listen(1));
-    Status consumer_result, producer_ready;
-    std::thread consumer([&] {
-      consumer_result = fence.WaitUntilReadyToStartOrForfeit(absl::Microseconds(rounds % 200), kE1);
-    });
-    std::thread listener_adder([&] { EXPECT_TRUE(listen(2) && listen(3)); });
-    std::thread waiter([&] { (void)fence.WaitForDone(absl::InfiniteDuration()); });
-    std::thread producer([&] {
-      producer_ready = fence.SignalReadyToStart(OkStatus());
-      // A refused producer still completes the frame, with its own error.
-      EXPECT_TRUE(fence.SignalDone(producer_ready.ok() ? OkStatus() : kE2).ok());
-    });
-    for (std::thread* t : {&consumer, &listener_adder, &waiter, &producer}) t->join();
-    const Status done = std::get<Status>(fence.WaitForDone(absl::ZeroDuration()));
-    if (consumer_result.ok()) {
-      EXPECT_TRUE(producer_ready.ok());
-      EXPECT_TRUE(done.ok());
-    } else {
-      EXPECT_THAT(consumer_result, StatusIs(StatusCode::kDeadlineExceeded));
-      EXPECT_THAT(producer_ready, StatusIs(StatusCode::kFailedPrecondition));
-      EXPECT_EQ(done, kE2);
-    }
-    ASSERT_EQ(calls.load(), 4);
-    // Listeners present at SignalDone see its status; one added after a
-    // forfeit runs at once with the forfeit status.
-    EXPECT_EQ(seen[0], done);
-    EXPECT_EQ(seen[1], done);
-    for (int i = 2; i < 4; ++i) EXPECT_TRUE(seen[i] == done || seen[i] == kE1) << seen[i];
+    Status heard, consumer, producer;
+    ASSERT_TRUE(fence.AddListener([&](Status s) { heard = s, ++calls; }).ok());
+    const auto listen = [&] { EXPECT_TRUE(fence.AddListener([&](Status) { ++calls; }).ok()); };
+    std::thread threads[] = {
+        std::thread([&] {
+          consumer = fence.WaitUntilReadyToStartOrForfeit(absl::Microseconds(rounds % 200), kE1);
+        }),
+        std::thread([&] { listen(), listen(); }),
+        std::thread([&] { (void)fence.WaitForDone(absl::InfiniteDuration()); }), std::thread([&] {
+          producer = fence.SignalReadyToStart(OkStatus());
+          // A refused producer still completes the frame, with its own error.
+          EXPECT_TRUE(fence.SignalDone(producer.ok() ? OkStatus() : kE2).ok());
+        })};
+    for (std::thread& t : threads) t.join();
+    EXPECT_EQ(consumer.ok(), producer.ok());
+    EXPECT_TRUE(consumer.ok() || IsDeadlineExceeded(consumer)) << consumer;
+    EXPECT_EQ(heard, consumer.ok() ? OkStatus() : kE2);
+    ASSERT_EQ(calls.load(), 3);
   }
 }
 
