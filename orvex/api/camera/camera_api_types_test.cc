@@ -14,28 +14,7 @@ E As(int64_t v) {
   return static_cast<E>(v);
 }
 
-template <typename... Names>
-std::string Joined(Names... names) {
-  std::string out;
-  ((out += std::string(names) + "|"), ...);
-  return out;
-}
-
-TEST(CameraApiTypesTest, TwoWayNames) {
-  EXPECT_EQ(Joined(ToString(StreamType::kInput), ToString(As<StreamType>(2)),
-                   ToString(StreamType::kOutput), ToString(FrameStatus::kOk),
-                   ToString(As<FrameStatus>(-1)), ToString(TorchMode::kOff),
-                   ToString(As<TorchMode>(9)), ToString(CameraDeviceStatus::kNotPresent),
-                   ToString(As<CameraDeviceStatus>(3)), ToString(StreamConfigurationMode::kNormal),
-                   ToString(As<StreamConfigurationMode>(0x8000)),
-                   ToString(DynamicRangeProfile::kStandard), ToString(As<DynamicRangeProfile>(0))),
-            "Input|Input|Output|OK|Error|Off|On|Not present|Present|Normal|Constrained high "
-            "speed|Standard|HLG10|");
-}
-
-// A name table of `count` entries from value `first`: its two ends print
-// their names, and the values just outside it (and the extremes) print empty.
-// The sanitizer build catches any read past a table.
+// A table of `count` names from value `first`: its ends, and empty outside it.
 template <typename E, typename F>
 void ExpectTable(F to_string, int count, const char* first_name, const char* last_name,
                  int first = 0) {
@@ -47,7 +26,20 @@ void ExpectTable(F to_string, int count, const char* first_name, const char* las
   }
 }
 
-TEST(CameraApiTypesTest, TableNames) {
+TEST(CameraApiTypesTest, Names) {
+  std::string out;
+  for (std::string_view name :
+       {ToString(As<StreamType>(0)), ToString(As<StreamType>(2)), ToString(StreamType::kOutput),
+        ToString(FrameStatus::kOk), ToString(As<FrameStatus>(-1)), ToString(TorchMode::kOff),
+        ToString(As<TorchMode>(9)), ToString(CameraDeviceStatus::kNotPresent),
+        ToString(As<CameraDeviceStatus>(3)), ToString(StreamConfigurationMode::kNormal),
+        ToString(As<StreamConfigurationMode>(0x8000)), ToString(DynamicRangeProfile::kStandard),
+        ToString(As<DynamicRangeProfile>(0))}) {
+    out += std::string(name) + "|";
+  }
+  EXPECT_EQ(out,
+            "Input|Input|Output|OK|Error|Off|On|Not present|Present|Normal|Constrained high "
+            "speed|Standard|HLG10|");
   auto to_string = [](auto v) { return ToString(v); };
   ExpectTable<PixelFormat>(to_string, 22, "Raw10", "YCBCR_420_SP_M_S10B_SBWC_L80");
   ExpectTable<Rotation>(to_string, 4, "CCW_0", "CCW_270");
@@ -58,9 +50,9 @@ TEST(CameraApiTypesTest, TableNames) {
   ExpectTable<ColorSpace::Standard>(color, 12, "Unspecified", "Adobe_RGB");
   ExpectTable<ColorSpace::Transfer>(color, 9, "Unspecified", "HLG");
   ExpectTable<ColorSpace::Range>(color, 4, "Unspecified", "Extended");
-  for (int64_t v : {int64_t{INT32_MIN}, int64_t{-1}, int64_t{0}, int64_t{2}, int64_t{3}}) {
-    EXPECT_EQ(IsRawFormat(As<PixelFormat>(v)), v >= 0 && v < 3) << v;
-  }
+  std::string raw;
+  for (int v : {INT32_MIN, -1, 0, 2, 3}) raw += IsRawFormat(As<PixelFormat>(v)) ? '1' : '0';
+  EXPECT_EQ(raw, "00110");
 }
 
 TEST(CameraApiTypesTest, DataSpaceAndUsageTexts) {
@@ -70,15 +62,12 @@ TEST(CameraApiTypesTest, DataSpaceAndUsageTexts) {
       "DataSpace(Color)::(Standard: BT2020, Transfer: RGB, Range: Limited)");
   EXPECT_EQ(ToString(DataSpace(CustomDataSpace::kJpegAppSegments)),
             "DataSpace(Custom)::JPEG APP segments");
-  const std::string all =
-      "[HwTexture|HwComposer|Protected|HwVideoEncoder|HwCameraWrite|HwCameraRead|HwCameraZsl|"
-      "KvuInput]";
+  // clang-format off
   const std::pair<uint64_t, std::string> cases[] = {
-      {0, "[]"},
-      {0x28, "[HwComposer|HwVideoEncoder]"},
-      {0x1 | 0x10 | 0x20000000, "[Protected|KvuInput]"},
-      {0x1 | 0x4 | 0x200 | (uint64_t{1} << 63), "[]"},
-      {0x2 | 0x8 | 0x10 | 0x20 | 0x40 | 0x80 | 0x100 | 0x20000000, all}};
+      {0, "[]"}, {0x1 | 0x10 | 0x20000000, "[Protected|KvuInput]"},
+      {0x4 | 0x200 | 1ull << 63, "[]"},
+      {0x1EA, "[HwTexture|HwComposer|HwVideoEncoder|HwCameraWrite|HwCameraRead|HwCameraZsl]"}};
+  // clang-format on
   for (const auto& [usage, want] : cases) EXPECT_EQ(ToString(usage), want) << usage;
 }
 

@@ -9,21 +9,17 @@ namespace android {
 namespace nuvora_camera_hal {
 namespace {
 
-TEST(VendorTagsTest, IdentifiersAndSectionNamesAreUnique) {
+TEST(VendorTagsTest, IdentifiersAndNamesAreUnique) {
   std::set<uint32_t> ids;
-  std::set<std::string> sections;
-  std::set<std::string> full_names;
+  std::set<std::string> names;
   for (const VendorTagSection& section : kVendorTagSections) {
-    EXPECT_TRUE(sections.insert(section.section_name).second) << section.section_name;
+    EXPECT_TRUE(names.insert(section.section_name).second) << section.section_name;
     for (const VendorTag& tag : section.tags) {
-      SCOPED_TRACE(tag.tag_name);
-      EXPECT_TRUE(ids.insert(tag.tag_id).second);
-      EXPECT_TRUE(full_names.insert(section.section_name + "." + tag.tag_name).second);
-      EXPECT_GE(tag.tag_id, kVendorTagStart);
-      EXPECT_LT(tag.tag_id, kVendorTagStart + 0x10000);
+      EXPECT_TRUE(ids.insert(tag.tag_id).second && tag.tag_id >> 16 == kVendorTagStart >> 16)
+          << tag.tag_name;
+      EXPECT_TRUE(names.insert(section.section_name + "." + tag.tag_name).second) << tag.tag_name;
     }
   }
-  EXPECT_EQ(ids.size(), 14u);
 }
 
 }  // namespace
