@@ -43,6 +43,8 @@ TEST(StatusTest, PrepareToModifyMoveAndEquality) {
   ok.PrepareToModify();
   record.PrepareToModify();
   EXPECT_TRUE(ok.ok());
+  EXPECT_EQ(record.code(), StatusCode::kNotFound);
+  EXPECT_EQ(record.message(), "");
   const Status shared = b;
   b.PrepareToModify();
   const uintptr_t alone = b.raw_rep_for_testing();

@@ -177,7 +177,8 @@ TEST(LocalToneMappingDeathTest, UnsoundDescriptions) {
       {[](Data& d) { d.guide_curve->desc.num_entries = 129; },  // outruns the heap storage
        "Guide curve entries outside the guide curve buffer",
        "Check failed: GuideCurveFits\\(\\*guide_curve\\) guide curve entries do not fit"},
-      {[](Data& d) { d.grid->desc.stride_z = 385; }, outside, layout},  // outruns the heap storage
+      // The last bias lands one element past the heap storage.
+      {[](Data& d) { d.grid->desc.stride_channel = 2; }, outside, layout},
       {[](Data& d) { d.grid->desc.stride_x = -2; }, outside, layout},
       {[](Data& d) { d.grid->desc.stride_channel = -1; }, outside, layout},
   };
