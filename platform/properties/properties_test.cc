@@ -109,7 +109,7 @@ TEST(HostPropertiesDeathTest, SeedsFromFileNamedByEnvironment) {
            HasSubstr("seed.prop:10: ignored property line: \\x1b[2J\\x7ftest.seed.esc=1\n"),
            ContainsRegex("seed.prop:11: ignored property line of 16777231 bytes .*: "
                          "test.seed.huge=h{65}\\.\\.\\.\n"),
-           Not(HasSubstr(":12:")), Not(HasSubstr(":13:")), Not(HasSubstr("read error")),
+           Not(HasSubstr("prop:12:")), Not(HasSubstr("prop:13:")), Not(HasSubstr("read error")),
            Not(HasSubstr("\x1b")))},
       {"missing", ContainsRegex("cannot read property file .*/missing named by")},
       {"/proc/self/mem", HasSubstr("/proc/self/mem: read error after line 0 (errno ")},
