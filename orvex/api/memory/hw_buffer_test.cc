@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <linux/dma-buf.h>
 #include <stdarg.h>
+#include <sys/ioctl.h>
 #include <sys/mman.h>
 #include <unistd.h>
 
