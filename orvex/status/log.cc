@@ -17,22 +17,32 @@ FatalLogLine::FatalLogLine(const char* unit, int line, std::string* check_text)
   stream_ << "Check failed: " << *text;
 }
 
-SigpipeGuard::SigpipeGuard() noexcept {
+namespace {
+
+sigset_t PipeSignalSet() {
+  sigset_t set;
+  sigemptyset(&set);
+  sigaddset(&set, SIGPIPE);
+  return set;
+}
+
+bool SigpipePending() {
   sigset_t pending;
-  was_pending_ = sigpending(&pending) == 0 && sigismember(&pending, SIGPIPE) == 1;
-  sigset_t pipe_signal;
-  sigemptyset(&pipe_signal);
-  sigaddset(&pipe_signal, SIGPIPE);
+  return sigpending(&pending) == 0 && sigismember(&pending, SIGPIPE) == 1;
+}
+
+}  // namespace
+
+SigpipeGuard::SigpipeGuard() noexcept {
+  was_pending_ = SigpipePending();
+  const sigset_t pipe_signal = PipeSignalSet();
   blocked_ = pthread_sigmask(SIG_BLOCK, &pipe_signal, &old_mask_) == 0;
 }
 
 SigpipeGuard::~SigpipeGuard() {
   if (!blocked_) return;
-  sigset_t pending;
-  if (!was_pending_ && sigpending(&pending) == 0 && sigismember(&pending, SIGPIPE) == 1) {
-    sigset_t pipe_signal;
-    sigemptyset(&pipe_signal);
-    sigaddset(&pipe_signal, SIGPIPE);
+  if (!was_pending_ && SigpipePending()) {
+    const sigset_t pipe_signal = PipeSignalSet();
     const struct timespec no_wait = {0, 0};
     while (sigtimedwait(&pipe_signal, nullptr, &no_wait) < 0 && errno == EINTR) {
     }

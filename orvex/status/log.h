@@ -51,11 +51,12 @@ template <size_t N>
 struct SourceUnit {
   consteval SourceUnit(const char (&path)[N]) {  // NOLINT: converts a literal
     constexpr char kRoot[] = "orvex/";
+    constexpr size_t kRootLength = sizeof(kRoot) - 1;
     size_t begin = 0;
-    for (size_t i = 0; i + 6 < N; ++i) {
+    for (size_t i = 0; i + kRootLength < N; ++i) {
       bool match = i == 0 || path[i - 1] == '/';
-      for (size_t k = 0; k < 6 && match; ++k) match = path[i + k] == kRoot[k];
-      if (match) begin = i + 6;
+      for (size_t k = 0; k < kRootLength && match; ++k) match = path[i + k] == kRoot[k];
+      if (match) begin = i + kRootLength;
     }
     size_t end = N - 1;
     for (size_t i = N - 1; i > begin && path[i - 1] != '/'; --i) {
